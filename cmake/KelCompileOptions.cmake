@@ -1,0 +1,55 @@
+# Compiler and linker options: warnings for everything of ours, hardening for the library.
+include(CheckCXXCompilerFlag)
+find_package(Threads REQUIRED)
+
+check_cxx_compiler_flag(-ftrivial-auto-var-init=zero KEL_HAS_AUTO_INIT_ZERO)
+check_cxx_compiler_flag(-Wthread-safety KEL_HAS_THREAD_SAFETY)
+
+set(KEL_SANITIZE_FLAGS "")
+if(KEL_SANITIZE)
+  set(KEL_SANITIZE_FLAGS -fsanitize=${KEL_SANITIZE} -fno-omit-frame-pointer)
+  if(KEL_SANITIZE MATCHES "undefined")
+    list(APPEND KEL_SANITIZE_FLAGS -fsanitize=float-cast-overflow -fno-sanitize-recover=all)
+  endif()
+endif()
+
+# Options of every target of ours: library, tests, examples.
+function(kel_common_options target)
+  set_target_properties(${target} PROPERTIES CXX_STANDARD 17 CXX_STANDARD_REQUIRED ON CXX_EXTENSIONS OFF)
+  target_compile_options(${target} PRIVATE -Wall -Wextra -Wpedantic -Wshadow ${KEL_SANITIZE_FLAGS})
+  target_link_options(${target} PRIVATE ${KEL_SANITIZE_FLAGS})
+  if(KEL_HAS_THREAD_SAFETY)
+    target_compile_options(${target} PRIVATE -Wthread-safety)
+  endif()
+  if(KEL_WERROR)
+    target_compile_options(${target} PRIVATE -Werror)
+  endif()
+  target_link_libraries(${target} PRIVATE Threads::Threads)
+endfunction()
+
+# Options of the library alone. Fortification is left to builds without sanitizers, which check
+# the same calls themselves. LTO stays off: it reverses the order of the initialisers.
+function(kel_library_options target)
+  kel_common_options(${target})
+  set_target_properties(${target} PROPERTIES
+      CXX_VISIBILITY_PRESET hidden VISIBILITY_INLINES_HIDDEN ON POSITION_INDEPENDENT_CODE ON
+      INTERPROCEDURAL_OPTIMIZATION OFF)
+  target_compile_definitions(${target} PRIVATE _FILE_OFFSET_BITS=64)
+  target_compile_options(${target} PRIVATE -fno-strict-overflow -fno-delete-null-pointer-checks
+      -Wformat -Werror=format-security)
+  if(NOT KEL_SANITIZE)
+    target_compile_definitions(${target} PRIVATE _GLIBCXX_ASSERTIONS)
+    target_compile_options(${target} PRIVATE -fstack-protector-strong -fstack-clash-protection
+        -fcf-protection)
+    if(CMAKE_BUILD_TYPE STREQUAL "RelWithDebInfo" OR CMAKE_BUILD_TYPE STREQUAL "Release")
+      target_compile_definitions(${target} PRIVATE _FORTIFY_SOURCE=3)
+    endif()
+    if(KEL_HAS_AUTO_INIT_ZERO)
+      target_compile_options(${target} PRIVATE -ftrivial-auto-var-init=zero)
+    endif()
+    target_link_options(${target} PRIVATE -Wl,-z,defs)
+  endif()
+  foreach(flag relro now noexecstack nodelete separate-code)
+    target_link_options(${target} PRIVATE -Wl,-z,${flag})
+  endforeach()
+endfunction()

@@ -1,0 +1,49 @@
+// What every header of the library starts from: the export macro, lock annotations and the
+// assumptions about the platform, stated in one place.
+//
+//   KEL_API                marks a class or function as part of the library's interface
+//   KEL_LOCAL              keeps a name out of the interface
+//   KEL_GUARDED_BY, ...    thread-safety annotations; they mean something to clang only
+//
+// SPDX-License-Identifier: MIT
+#ifndef KEL_CONFIG_H
+#define KEL_CONFIG_H
+
+#include <sys/time.h>
+
+#include <cstddef>
+#include <cstdint>
+
+#if !defined(__linux__) || !(defined(__i386__) || defined(__x86_64__))
+#error "KEL supports Linux on x86 and x86-64"
+#endif
+
+#define KEL_API __attribute__((visibility("default")))
+#define KEL_LOCAL __attribute__((visibility("hidden")))
+
+#if defined(__clang__)
+#define KEL_THREAD_ANNOTATION(x) __attribute__((x))
+#else
+#define KEL_THREAD_ANNOTATION(x)
+#endif
+
+#define KEL_CAPABILITY(x) KEL_THREAD_ANNOTATION(capability(x))
+#define KEL_SCOPED_CAPABILITY KEL_THREAD_ANNOTATION(scoped_lockable)
+#define KEL_GUARDED_BY(x) KEL_THREAD_ANNOTATION(guarded_by(x))
+#define KEL_PT_GUARDED_BY(x) KEL_THREAD_ANNOTATION(pt_guarded_by(x))
+#define KEL_REQUIRES(...) KEL_THREAD_ANNOTATION(requires_capability(__VA_ARGS__))
+#define KEL_ACQUIRE(...) KEL_THREAD_ANNOTATION(acquire_capability(__VA_ARGS__))
+#define KEL_RELEASE(...) KEL_THREAD_ANNOTATION(release_capability(__VA_ARGS__))
+#define KEL_EXCLUDES(...) KEL_THREAD_ANNOTATION(locks_excluded(__VA_ARGS__))
+#define KEL_NO_THREAD_SAFETY_ANALYSIS KEL_THREAD_ANNOTATION(no_thread_safety_analysis)
+
+// Object layouts, slot order and the numbers on the wire rest on these.
+static_assert(sizeof(short) == 2 && sizeof(int) == 4 && sizeof(long long) == 8, "integer widths");
+static_assert(sizeof(float) == 4 && sizeof(double) == 8, "floating-point widths");
+static_assert(sizeof(wchar_t) == 4, "wide characters are four bytes");
+static_assert(sizeof(long) == sizeof(void*), "long is as wide as a pointer");
+#if defined(__i386__)
+static_assert(sizeof(timeval) == 8, "timeval has 32-bit fields on x86: do not define _TIME_BITS=64");
+#endif
+
+#endif

@@ -1,0 +1,122 @@
+// Mutexes and the guards that hold them for a scope.
+//
+//   KELIMutex       what code locks when it does not care which mutex it is
+//   KELMutex        plain: the thread that holds it must not lock it again
+//   KELRMutex       recursive: as many unlocks as locks
+//   KELMutex_var    holds a KELMutex until the end of the scope
+//   KELRMutex_var   holds a KELRMutex until the end of the scope
+//   KELDMutex_var   the same over a KELMutex that may be absent or come later
+//
+//     KELMutex_var hold(_mutex, 1);   // unlocked when hold goes out of scope
+//
+// A mutex may be used by any thread. A guard belongs to the scope that made it.
+//
+// Creating a mutex that the system refuses throws CORBA::NO_RESOURCES with the value of errno as
+// minor code and COMPLETED_NO. A lock or unlock that the system refuses prints the name of the
+// failed call on standard error and ends the process, in release builds too.
+//
+// SPDX-License-Identifier: MIT
+#ifndef KEL_CORE_MUTEX_H
+#define KEL_CORE_MUTEX_H
+
+#include <kel/config.h>
+#include <pthread.h>
+
+class KEL_API KEL_CAPABILITY("mutex") KELIMutex {
+public:
+    KELIMutex() = default;
+    KELIMutex(const KELIMutex&) = delete;
+    KELIMutex& operator=(const KELIMutex&) = delete;
+
+    // Call lock() and unlock() of the concrete class.
+    virtual void v_lock() KEL_ACQUIRE() = 0;
+    virtual void v_unlock() KEL_RELEASE() = 0;
+    virtual ~KELIMutex();
+};
+
+class KEL_API KEL_CAPABILITY("mutex") KELMutex : public KELIMutex {
+public:
+    KELMutex();
+    void v_lock() override KEL_ACQUIRE();
+    void v_unlock() override KEL_RELEASE();
+    ~KELMutex() override;
+
+    void lock() KEL_ACQUIRE();
+    void unlock() KEL_RELEASE();
+
+private:
+    friend class KELCondition;  // waits on _mutex itself
+
+    pthread_mutex_t _mutex;
+};
+
+class KEL_API KEL_CAPABILITY("mutex") KELRMutex : public KELIMutex {
+public:
+    KELRMutex();
+    void v_lock() override KEL_ACQUIRE();
+    void v_unlock() override KEL_RELEASE();
+    ~KELRMutex() override;
+
+    void lock() KEL_ACQUIRE();
+    void unlock() KEL_RELEASE();
+
+private:
+    pthread_mutexattr_t _attributes;
+    pthread_mutex_t _mutex;
+};
+
+class KEL_API KEL_SCOPED_CAPABILITY KELMutex_var {
+public:
+    // Locks `m` whatever `flag` says. The flag decides whether the destructor unlocks: with 0 the
+    // mutex stays locked when the guard is gone and somebody else has to unlock it.
+    KELMutex_var(KELMutex& m, unsigned char flag) KEL_ACQUIRE(m);
+    KELMutex_var(const KELMutex_var&) = delete;
+    KELMutex_var& operator=(const KELMutex_var&) = delete;
+    ~KELMutex_var() KEL_RELEASE();
+
+    // Locks the mutex again after an unlock(). A second lock() in a row deadlocks.
+    void lock() KEL_ACQUIRE();
+    void unlock() KEL_RELEASE();
+    KELMutex* operator->() { return &_mtx; }
+
+    KELMutex& _mtx;
+    unsigned char _locked;  // non-zero: the destructor unlocks
+};
+
+class KEL_API KEL_SCOPED_CAPABILITY KELRMutex_var {
+public:
+    // As for KELMutex_var: the flag decides only whether the destructor unlocks.
+    KELRMutex_var(KELRMutex& m, unsigned char flag) KEL_ACQUIRE(m);
+    KELRMutex_var(const KELRMutex_var&) = delete;
+    KELRMutex_var& operator=(const KELRMutex_var&) = delete;
+    ~KELRMutex_var() KEL_RELEASE();
+
+    void lock() KEL_ACQUIRE();
+    void unlock() KEL_RELEASE();
+    KELRMutex* operator->() { return &_mtx; }
+
+    KELRMutex& _mtx;
+    unsigned char _locked;  // non-zero: the destructor unlocks
+};
+
+class KEL_API KELDMutex_var {
+public:
+    // Locks `m` unless it is null; the flag decides only whether the destructor unlocks.
+    KELDMutex_var(KELMutex* m, unsigned char flag) KEL_NO_THREAD_SAFETY_ANALYSIS;
+    KELDMutex_var(const KELDMutex_var&) = delete;
+    KELDMutex_var& operator=(const KELDMutex_var&) = delete;
+    ~KELDMutex_var() KEL_NO_THREAD_SAFETY_ANALYSIS;
+
+    // Attaches and locks `m`; null attaches nothing. Ends the process when a mutex is attached
+    // already, also one that unlock() released.
+    void set(KELMutex* m) KEL_NO_THREAD_SAFETY_ANALYSIS;
+
+    // Unlocks the mutex, if there is one, but keeps it attached.
+    void unlock() KEL_NO_THREAD_SAFETY_ANALYSIS;
+    KELMutex* operator->() { return _mtx; }
+
+    KELMutex* _mtx;
+    unsigned char _locked;  // non-zero: the destructor unlocks
+};
+
+#endif

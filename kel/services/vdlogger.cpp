@@ -1,0 +1,261 @@
+// SPDX-License-Identifier: MIT
+#include <kel/core/internal/failure.h>
+#include <kel/services/debug_logger.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstring>
+#include <ctime>
+#include <ios>
+#include <new>
+
+using kel::internal::assertion_failed;
+
+namespace {
+
+const std::size_t name_limit = 1024;  // bytes of a log's or a backup's name, terminator not counted
+const std::uint32_t default_trim_size = 1024 * 1024;
+const std::int32_t lines_between_trims = 499;
+const std::uint32_t trim_bit = 1;       // of _flags
+const std::uint32_t trace_all_bit = 1;  // of _masks[0]
+
+// What the library builds when it is loaded.
+std::ios_base::Init standard_streams;
+[[maybe_unused]] KELDebugLogger* const shared_logger = KELDebugLogger::instance();
+
+// The index of the mask that `module` belongs to by its top four bits, or -1.
+int group_of(unsigned int module) {
+    static const signed char groups[16] = {0, 1, 2, -1, 3, -1, -1, -1, 4, -1, -1, -1, -1, -1, -1, -1};
+    return groups[module >> 28];
+}
+
+// The same, but a module without a group ends the process, naming `function` and `line`.
+int checked_group(unsigned int module, unsigned line, const char* function) {
+    const int group = group_of(module);
+    if (group == -1) assertion_failed("i != -1", "vdlogger", line, function);
+    return group;
+}
+
+// Masks, flags and the size limit are read without the lock.
+std::uint32_t read_word(const std::uint32_t& word) { return __atomic_load_n(&word, __ATOMIC_RELAXED); }
+void write_word(std::uint32_t& word, std::uint32_t value) {
+    __atomic_store_n(&word, value, __ATOMIC_RELAXED);
+}
+
+}  // namespace
+
+// Static objects of a client may log before this unit is initialised. The logger is never destroyed:
+// detached threads may still log while the process exits, and the C library flushes every stream after
+// that.
+KELDebugLogger* KELDebugLogger::instance() {
+    alignas(KELDebugLogger) static unsigned char storage[sizeof(KELDebugLogger)];
+    static KELDebugLogger* const logger = new (storage) KELDebugLogger;
+    return logger;
+}
+
+KELDebugLogger::KELDebugLogger() : KELDebugLogger(nullptr, 0) {}
+
+KELDebugLogger::KELDebugLogger(const char* file) : KELDebugLogger(file, trim_bit) {}
+
+KELDebugLogger::KELDebugLogger(const char* file, unsigned int flags)
+    : _file_name(nullptr), _fp(stdout), _pending(0) {
+    init(file, flags);
+}
+
+KELDebugLogger::~KELDebugLogger() {
+    abandon_file();
+    delete[] _file_name;
+}
+
+// Deliberate: a name once set stays, and a file that is open or pending stays so when another name is
+// given. Pinned by DebugLogFile.InitKeepsANameThatIsSet.
+void KELDebugLogger::init(const char* file, unsigned int flags) {
+    KELRMutex_var hold(*this, 1);
+    if (file != nullptr) {
+        setLogFile(file);
+    } else {
+        abandon_file();
+        _fp = stdout;
+        _pending = 0;
+    }
+    _fd = -1;
+    write_word(_flags, flags);
+    for (std::uint32_t& mask : _masks) write_word(mask, 0);
+    write_word(_trim_size, default_trim_size);
+    _lines = 0;
+    _in_line = 0;
+    _spare = 0;
+}
+
+unsigned char KELDebugLogger::setLogFile(const char* file) {
+    KELRMutex_var hold(*this, 1);
+    if (file == nullptr || *file == '\0' || _file_name != nullptr) return 0;
+    char* const name = new char[name_limit + 1];
+    const std::size_t length = strnlen(file, name_limit);
+    std::memcpy(name, file, length);
+    name[length] = '\0';
+    _file_name = name;
+    _pending = 1;
+    return 1;
+}
+
+// A stream that a failed close has lost is opened again as well.
+void KELDebugLogger::openFile() {
+    KELRMutex_var hold(*this, 1);
+    if (is_open()) return;
+    std::FILE* const opened = std::fopen(_file_name, "a");
+    _pending = opened == nullptr;
+    _fd = -1;
+    if (opened == nullptr) return;
+    _fp = opened;
+    _fd = fileno(opened);
+    // Deliberate: everybody may write the log, as processes of several users share one.
+    // Pinned by DebugLogFile.OpeningGivesTheFileMode0666WhateverTheUmask.
+    fchmod(_fd, 0666);
+}
+
+// Deliberate: a failed close changes no field but the stream itself. When the flush fails the stream is
+// intact and goes on; when only the close fails the C library has given the stream up, and the next
+// enabled start() opens the file again. Pinned by DebugLogFile.AFailedCloseChangesNothing.
+void KELDebugLogger::closeFile() {
+    KELRMutex_var hold(*this, 1);
+    if (!is_open() || _fp == stdout) return;
+    if (std::fflush(_fp) != 0) return;
+    const int rc = std::fclose(_fp);
+    _fp = nullptr;
+    if (rc != 0) return;
+    _pending = 1;
+    _fd = -1;
+}
+
+bool KELDebugLogger::is_open() const { return _pending == 0 && _fp != nullptr; }
+
+void KELDebugLogger::abandon_file() {
+    if (is_open() && _fp != stdout) std::fclose(_fp);
+    _fp = nullptr;
+}
+
+// Deliberate: the lock stays held until endl, also when nothing is printed, and a line that is open lets
+// the items of a nested start() through. The module is checked before the lock is taken.
+// Pinned by DebugLogLine.ADisabledStartHoldsTheLockUntilEndl, DebugLogLine.ItemsOfANestedDisabledStartPrint.
+KELDebugLogger& KELDebugLogger::start(unsigned int level, unsigned int module, const char* file, int line) {
+    const int group =
+        checked_group(module, __LINE__,
+                      "KELDebugLogger& KELDebugLogger::start(unsigned int, unsigned int, const char*, int)");
+    lock();
+    if (_in_line != 0 || !prints(module, group)) return *this;
+    openFile();
+    if (!is_open()) return *this;
+    // Deliberate: the check comes before its header is printed, so the first one looks at 499 headers and
+    // later ones at 500. Pinned by DebugLogTrimming.TheFiveHundredthStartTrimsBeforeItsHeader.
+    if (++_lines > lines_between_trims) {
+        trimLog();
+        _lines = 0;
+        if (!is_open()) return *this;
+    }
+    print_header(level, module, file, line);
+    _in_line = 1;
+    return *this;
+}
+
+bool KELDebugLogger::prints(unsigned int module, int group) const {
+    return (read_word(_masks[group]) & module) != 0 || (read_word(_masks[0]) & trace_all_bit) != 0;
+}
+
+void KELDebugLogger::print_header(unsigned int level, unsigned int module, const char* file, int line) {
+    const std::time_t now = std::time(nullptr);
+    char text[26];
+    tzset();  // ctime_r, unlike ctime, need not look at a changed TZ
+    if (ctime_r(&now, text) == nullptr) text[0] = '\0';
+    text[24] = '\0';
+    std::fprintf(_fp, "=> %s,%02x,%08x,%s,%d,%d\n", text, level, module, file, line, static_cast<int>(now));
+}
+
+// Inside a line _fp is null only after a closeFile() in its middle; the rest of that line is lost.
+KELDebugLogger& KELDebugLogger::operator<<(const char* s) {
+    if (_in_line != 0 && _fp != nullptr) std::fputs(s != nullptr ? s : "<null>", _fp);
+    return *this;
+}
+
+KELDebugLogger& KELDebugLogger::operator<<(long n) {
+    if (_in_line != 0 && _fp != nullptr) std::fprintf(_fp, "%ld", n);
+    return *this;
+}
+
+KELDebugLogger& KELDebugLogger::operator<<(KELDebugLogger& (*manipulator)(KELDebugLogger&)) {
+    return manipulator(*this);
+}
+
+// Deliberate: the inner endl of a nest ends the line, and one without a start() fails in unlock().
+// Pinned by DebugLogLine.TheInnerEndlOfANestEndsTheLine, DebugLogLine.EndlWithoutStartEndsTheProcess.
+KELDebugLogger& endl(KELDebugLogger& log) {
+    if (log._in_line != 0) {
+        if (log._fp != nullptr) {
+            std::fputc('\n', log._fp);
+            std::fflush(log._fp);
+        }
+        log._in_line = 0;
+    }
+    log.unlock();
+    return log;
+}
+
+// The two line numbers are fixed: scripts that watch for these assertions match them.
+void KELDebugLogger::traceModule(unsigned int module) {
+    const int group = checked_group(module, 261, "void KELDebugLogger::traceModule(unsigned int)");
+    KELRMutex_var hold(*this, 1);
+    write_word(_masks[group], _masks[group] | module);
+}
+
+void KELDebugLogger::untraceModule(unsigned int module) {
+    const int group = checked_group(module, 272, "void KELDebugLogger::untraceModule(unsigned int)");
+    KELRMutex_var hold(*this, 1);
+    write_word(_masks[group], _masks[group] & ~module);
+}
+
+// Deliberate: the group bits are part of both words, so one enabled module of groups 1 to 4 makes every
+// module of its group look enabled. Pinned by DebugLogger.TheGroupBitAloneMakesAModuleEnabled.
+unsigned char KELDebugLogger::isTraceEnabledFor(unsigned int module) const {
+    const int group = checked_group(module, __LINE__,
+                                    "unsigned char KELDebugLogger::isTraceEnabledFor(unsigned int) const");
+    return (read_word(_masks[group]) & module) != 0;
+}
+
+void KELDebugLogger::setFlag(unsigned int bits) {
+    KELRMutex_var hold(*this, 1);
+    write_word(_flags, _flags | bits);
+}
+
+void KELDebugLogger::unsetFlag(unsigned int bits) {
+    KELRMutex_var hold(*this, 1);
+    write_word(_flags, _flags & ~bits);
+}
+
+// Deliberate: trimming stays on. Pinned by DebugLogger.ClearFlagLeavesTrimmingOn.
+void KELDebugLogger::clearFlag() {
+    KELRMutex_var hold(*this, 1);
+    write_word(_flags, trim_bit);
+}
+
+unsigned int KELDebugLogger::flag() const { return read_word(_flags); }
+
+void KELDebugLogger::setTrimSize(unsigned int kb) {
+    if (kb != 0) write_word(_trim_size, kb * 1024);
+}
+
+// Whatever fails here is tried again 500 headers later. A cut backup name would be another file, so a
+// name that is too long leaves the log as it is.
+void KELDebugLogger::trimLog() {
+    KELRMutex_var hold(*this, 1);
+    if (!is_open() || _fd == -1 || (flag() & trim_bit) == 0) return;
+    struct stat log;
+    if (fstat(_fd, &log) != 0 || log.st_size < read_word(_trim_size)) return;
+    char backup[name_limit + 1];
+    const int length = std::snprintf(backup, sizeof backup, "%so", _file_name);
+    if (length < 0 || static_cast<std::size_t>(length) > name_limit) return;
+    unlink(backup);
+    closeFile();
+    if (_pending == 0) return;  // the log could not be closed: it keeps its name
+    std::rename(_file_name, backup);
+    openFile();
+}
