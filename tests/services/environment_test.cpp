@@ -216,8 +216,9 @@ TEST(CurrentEnvironment, LiesInsideThePerThreadObject) {
 }
 
 TEST(CurrentEnvironment, IsTheThreadsObjectOfItsSlot) {
-    EXPECT_EQ(KELThreadLocal::instance(CurrentEnvironment::key_id()), CurrentEnvironment::instance());
-    EXPECT_EQ(CurrentEnvironment::instance()->_slot, CurrentEnvironment::key_id());
+    CurrentEnvironment* const mine = CurrentEnvironment::instance();
+    EXPECT_EQ(KELThreadLocal::instance(CurrentEnvironment::key_id()), mine);
+    EXPECT_EQ(mine->_slot, CurrentEnvironment::key_id());
 }
 
 TEST(CurrentEnvironment, DiffersBetweenThreads) {
