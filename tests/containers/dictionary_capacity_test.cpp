@@ -67,6 +67,12 @@ TEST_F(DictionaryCapacity, CapacityBeyondTheSlotNumbersIsRefused) {
     EXPECT_EQ(mirror_of(table).mask, 31u);
 }
 
+#if defined(__i386__)  // with wider addresses there may be so much memory
+TEST_F(DictionaryCapacity, SlotsBeyondTheAddressesOfTheMachineAreRefused) {
+    EXPECT_THROW(IntegerTable(0x40000000ul), std::bad_alloc);
+}
+#endif
+
 TEST_F(DictionaryCapacity, ResizeToSixteenGivesThirtyTwoSlots) {
     IntegerTable table;
     table.reSize(16);
@@ -142,6 +148,18 @@ TEST_F(DictionaryCapacity, LastIndexBeyondASmallerTableIsNotUsed) {
     table.atKey(KELUniqueId(1));
     table.reSize(1);
     EXPECT_EQ(table.removeKeyIfExists(KELUniqueId(1)), 1);
+}
+
+// So far that whoever looks there finds no memory.
+TEST_F(DictionaryCapacity, LastIndexFarBeyondASmallerTableIsNotUsed) {
+    const unsigned bits = 22;
+    const TestKey key = {hash_for_home((1u << bits) - 1, bits), 1};
+    KELDictionary<TestKey, int> table;
+    table.reSize(1ul << (bits - 1));
+    table.add(key, 10);
+    ASSERT_EQ(mirror_of(table).last_index, (1u << bits) - 1);
+    table.reSize(1);
+    EXPECT_EQ(table.atKey(key), 10);
 }
 
 TEST_F(DictionaryCapacity, ResizeBelowTheCountIsRaisedUntilOneSlotStaysEmpty) {

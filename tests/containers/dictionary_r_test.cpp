@@ -21,6 +21,12 @@ typedef KELDictionary_r<CORBA_String_var, CORBA_String_var> Options;
 
 class DictionaryR : public FaultTest {};
 
+bool lies_outside(const Options& table, const void* place) {
+    const auto start = reinterpret_cast<std::uintptr_t>(&table);
+    const auto where = reinterpret_cast<std::uintptr_t>(place);
+    return where < start || where >= start + sizeof table;
+}
+
 TEST_F(DictionaryR, LockLiesBetweenTheInlineTableAndTheFreeCount) {
     Options table;
     EXPECT_EQ(static_cast<const void*>(&table.rwlock()),
@@ -65,6 +71,14 @@ TEST_F(DictionaryR, BehavesLikeThePlainTable) {
     Options::Assoc* const entry = ++i;
     ASSERT_NE(entry, nullptr);
     EXPECT_STREQ(entry->_key, "vesta");
+}
+
+TEST_F(DictionaryR, MoreThanThirtyTwoSlotsLieOnTheHeap) {
+    Options table(33);
+    EXPECT_EQ(table.capacity(), 128u);
+    EXPECT_TRUE(lies_outside(table, mirror_of(table).table));
+    table.add("vesta", "4");
+    EXPECT_STREQ(table.atKey("vesta"), "4");
 }
 
 TEST_F(DictionaryR, GrowsLikeThePlainTable) {

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: MIT
 // How entries leave a dictionary: holes, recycled records, the callback and the destructor.
 #include <kel/containers/dictionary.h>
+#include <kel/core/thread.h>
+#include <kel/core/thread_local.h>
 #include <kel/core/unique_id.h>
 #include <kel/exceptions/standard.h>
 
@@ -273,6 +275,17 @@ TEST_F(DictionaryRemoval, CallbackHearsOfEachRemovedEntry) {
     table.removeKey(key_at(4, 1));
     table.removeKeyIfExists(key_at(9, 2));
     EXPECT_EQ(removed, (std::vector<std::pair<int, int>>{{1, 10}, {2, 20}}));
+}
+
+TEST_F(DictionaryRemoval, CallbackHearsOfThreadsToo) {
+    static std::vector<pthread_t> heard;
+    heard.clear();
+    KELDictionary<KELThreadId, KELDictionary<KELUniqueId, KELThreadLocal*>*> table(
+        16, [](KELThreadId id, KELDictionary<KELUniqueId, KELThreadLocal*>*) { heard.push_back(id.id()); });
+    table.add(KELThreadId(7), nullptr);
+    table.add(KELThreadId(8), nullptr);
+    table.removeKey(KELThreadId(7));
+    EXPECT_EQ(heard, (std::vector<pthread_t>{7}));
 }
 
 TEST_F(DictionaryRemoval, CallbackOfARemovalBySlotDependsOnNotify) {

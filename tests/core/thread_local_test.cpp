@@ -191,12 +191,14 @@ const FreshScene no_key("no_key", [] {
     std::cout << seen.thrown << ' ' << seen.printed << ' ' << std::hex << seen.minor << ' ' << seen.completed
               << ' ' << seen.calls << ' ' << (KELThreadLocal::instance(1) == nullptr)
               << is_held(KELThreadLocal::_mutex);
+    reset_faults();
+    Armed armed;
     Local object(1);
-    std::cout << (KELThreadLocal::instance(1) == &object);
+    std::cout << ' ' << (KELThreadLocal::instance(1) == &object) << seams::pthread_key_create.calls();
 });
 
 TEST_F(ThreadLocal, FailedKeyThrowsNoResourcesAndIsTriedAgainByTheNextConstruction) {
-    EXPECT_EQ(no_key.play().out, "1 pthread_key_create 4f4d0007 1 1 101");
+    EXPECT_EQ(no_key.play().out, "1 pthread_key_create 4f4d0007 1 1 10 11");
 }
 
 const FreshScene end_of_main("end_of_main", [] {

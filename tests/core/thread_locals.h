@@ -68,11 +68,11 @@ protected:
     }
     static KELThreadLocal::SlotTable* my_table() { return table_of(pthread_self()); }
 
-    // The values that are given to the key of the calling thread.
+    // The values that are given to the key of the calling thread. Nothing is expected here: a failure
+    // makes GoogleTest set a key of its own, under a lock that it does not take twice.
     void record_key_values() {
         seams::pthread_setspecific.script([this](pthread_key_t key, const void* value) {
-            EXPECT_EQ(key, KELThreadLocal::_key);
-            key_values.push_back(value);
+            if (key == KELThreadLocal::_key) key_values.push_back(value);
             return seams::pthread_setspecific.real(key, value);
         });
     }

@@ -155,6 +155,17 @@ TEST(Registry, GrowsBeyondItsFirstCapacity) {
     EXPECT_EQ(Description::desc("IDL:omg.org/CORBA/UNKNOWN:1.0"), &CORBA_UNKNOWN::_description);
 }
 
+TEST(Registry, TakesNoLock) {
+    kel::test::reset_faults();
+    {
+        Armed armed;
+        const std::unique_ptr<Description> d = describe(an_id);
+        Description::desc(an_id);
+    }
+    EXPECT_EQ(kel::test::seams::pthread_mutex_lock.calls(), 0);
+    kel::test::reset_faults();
+}
+
 TEST(Registry, ThreadsMayLookUpTogether) {
     const char* const ids[] = {"IDL:test/Sample:1.0", "IDL:test/Derived:1.0", "IDL:omg.org/CORBA/UNKNOWN:1.0",
                                "IDL:test/None:1.0"};

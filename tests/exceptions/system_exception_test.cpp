@@ -165,6 +165,13 @@ TEST(SystemExceptionBody, ReadingKeepsAStatusThatIsNoneOfTheThree) {
     EXPECT_EQ(static_cast<std::uint32_t>(e.completed()), 7u);
 }
 
+TEST(SystemExceptionBody, ReadingKeepsTheGreatestStatus) {
+    ScriptedIstream in({5, 0xffffffff});
+    CORBA_BAD_PARAM e;
+    e._copy(in);
+    EXPECT_EQ(static_cast<std::uint32_t>(e.completed()), 0xffffffffu);
+}
+
 TEST(SystemExceptionBody, StatusWhoseLowBitsAreAValidOneIsStillNoneOfTheThree) {
     ScriptedIstream in({5, top_bit | 1});
     CORBA_BAD_PARAM e;

@@ -272,6 +272,20 @@ TEST_F(Whence, ColonBlankAndSemicolonSeparateFolders) {
     EXPECT_THAT(asked, ElementsAre("tool", "/bin/tool", "/usr/bin/tool", "/sbin/tool"));
 }
 
+TEST_F(Whence, ALongFolderIsWrittenWhole) {
+    const std::string folder = "/" + std::string(5000, 'x');
+    path = "/bin:" + folder;
+    existing = {folder + "/tool"};
+    std::vector<char> result(folder.size() + 6);
+    bool found = false;
+    {
+        Armed armed;
+        found = KELPortable::vwhence("tool", result.data());
+    }
+    EXPECT_TRUE(found);
+    EXPECT_EQ(result.data(), folder + "/tool");
+}
+
 TEST_F(Whence, StopsAtTheFirstFolderThatHasTheName) {
     existing = {"/usr/bin/tool", "/sbin/tool"};
     EXPECT_TRUE(search("tool"));

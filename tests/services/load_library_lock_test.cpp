@@ -46,6 +46,28 @@ TEST_F(LoadLibraryLock, IsNotTakenToFindTheSharedLoader) {
               0);
 }
 
+// The other thread's turn comes while the first one makes its loader, as that makes a mutex.
+TEST_F(LoadLibraryLock, TheSharedLoaderIsThatOfTheThreadThatPublishesItFirst) {
+    KELLoadLibrary* const shared = KELLoadLibrary::_instance;
+    KELLoadLibrary::_instance = nullptr;
+    KELLoadLibrary* others = nullptr;
+    seams::pthread_mutex_init.script([&](pthread_mutex_t* m, const pthread_mutexattr_t* a) {
+        std::thread([&] { others = KELLoadLibrary::instance(); }).join();
+        return seams::pthread_mutex_init.real(m, a);
+    });
+    const long blocks = AllocationPlan::live_blocks();
+    KELLoadLibrary* mine = nullptr;
+    {
+        Armed armed;
+        mine = KELLoadLibrary::instance();
+    }
+    EXPECT_NE(others, nullptr);
+    EXPECT_EQ(mine, others);
+    EXPECT_EQ(AllocationPlan::live_blocks(), blocks + 1) << "the loader that came second is gone";
+    delete others;
+    KELLoadLibrary::_instance = shared;
+}
+
 TEST_F(LoadLibraryLock, IsTakenOnceByEachOperation) {
     available = {"x"};
     EXPECT_EQ(locks_taken_by([this] { load("x"); }), 1);

@@ -59,12 +59,14 @@ INSTANTIATE_TEST_SUITE_P(EveryType, InputArrays, ::testing::ValuesIn(array_cases
                          [](const auto& case_info) { return case_info.param.name; });
 
 TEST(InputArrays, LongLongArraysMoveTheOffsetBackBySeven) {
-    Reader r("1 2 3 4 5 ");
-    long long values[3];
-    r.in._offset = 20;
-    r.in.get(values, 3u);
-    EXPECT_EQ(values[2], 3);
-    EXPECT_EQ(r.in.cur_in_offset(), 13u);
+    for (unsigned int n : {0u, 1u, 3u}) {
+        Reader r("1 2 3 4 5 ");
+        long long values[3] = {};
+        r.in._offset = 20;
+        r.in.get(values, n);
+        EXPECT_EQ(values[2], n == 3 ? 3 : 0);
+        EXPECT_EQ(r.in.cur_in_offset(), 13u) << n;
+    }
 }
 
 TEST(InputArrays, LongLongArraysWrapTheOffsetBelowZero) {

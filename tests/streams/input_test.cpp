@@ -259,7 +259,10 @@ TEST(InputScalars, UnsignedCharCountsFourAndOne) {
 }
 
 TEST(InputScalars, ReadingBackCountsDifferentlyFromWriting) {
-    Reader r("-2 7 200 x ");
+    Writer w;
+    w.out << short(-2) << 7 << static_cast<unsigned char>(200) << 'x';
+    EXPECT_EQ(w.out.cur_out_offset(), 12u);
+    Reader r(w.written());
     short a = 0;
     int b = 0;
     unsigned char c = 0;

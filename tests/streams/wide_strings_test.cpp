@@ -2,7 +2,9 @@
 // Wide strings: written without their length, read with it.
 
 #include <gtest/gtest.h>
+#include <kel/containers/wstrings.h>
 
+#include <cwchar>
 #include <iomanip>
 #include <iostream>
 #include <memory>
@@ -172,11 +174,15 @@ TEST(WideStringReading, ACallersBufferIsFilledAndNotTouchedBehindTheCount) {
 }
 
 TEST(WideStringReading, ANewArrayHasAZeroBehindItsCharacters) {
-    Reader r("2 97 98 |");
-    wchar_t* ws = nullptr;
+    Reader r("5 97 98 99 100 101 |");
+    // The block that the array will get holds no zero behind its characters.
+    wchar_t* ws = CORBA::wstring_alloc(5);
+    std::wmemset(ws, L'x', 6);
+    CORBA::wstring_free(ws);
+    ws = nullptr;
     r.in >> ws;
     WideBuffer hold(ws);
-    EXPECT_EQ(std::wstring(ws), L"ab");
+    EXPECT_EQ(std::wstring(ws), L"abcde");
 }
 
 TEST(WideStringReading, CharactersThatAreMissingAreZeros) {
