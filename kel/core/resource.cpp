@@ -85,7 +85,10 @@ KELResource::KELResource(const KELResource&) : _impl(nullptr) {}
 // Both objects keep their own references.
 KELResource& KELResource::operator=(const KELResource&) { return *this; }
 
-KELResource::~KELResource() { KELResourceImplFactory::instance()->destroy(_impl); }
+// Only a record leads to the pool, which exists then: making it may fail, and a destructor must not.
+KELResource::~KELResource() {
+    if (_impl != nullptr) KELResourceImplFactory::instance()->destroy(_impl);
+}
 
 // Two threads may make the first reference together: one record is published, the other goes back.
 KELResourceImpl* KELResource::record() {

@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <kel/core/resource.h>
+#include <kel/exceptions/standard.h>
 #include <sys/mman.h>
 
 #include <cstring>
@@ -36,6 +37,22 @@ TEST_F(Resource, FirstRefGivesTwo) {
     EXPECT_EQ(object._num_refs(), 2ul);
 }
 
+// The first use of the pool in a process fails for ever; a destructor that made the pool would throw.
+const FreshScene no_pool_for_records("no_pool_for_records", [] {
+    Armed armed;
+    seams::pthread_mutex_init.fail(1, EAGAIN, true);
+    try {
+        Counted object;
+        object._ref();
+    } catch (const CORBA_NO_RESOURCES&) {
+        std::cout << "thrown";
+    }
+});
+
+TEST_F(Resource, AnObjectWithoutARecordIsDestroyedWithoutThePool) {
+    EXPECT_EQ(no_pool_for_records.play().out, "thrown");
+}
+
 TEST_F(Resource, EveryRefCounts) {
     Counted object;
     object._ref();
@@ -58,6 +75,24 @@ TEST_F(Resource, RefThenUnrefTwiceGivesTwoOneZeroAndDeletes) {
     EXPECT_EQ(deleted, 0);
     EXPECT_EQ(object->_unref(), 0l);
     EXPECT_EQ(deleted, 1);
+}
+
+class AsksAtItsEnd : public KELResource {
+public:
+    explicit AsksAtItsEnd(bool& held) : _held(held) {}
+    ~AsksAtItsEnd() override { _held = is_held(*impl_of(mutex_of(_impl))); }
+
+private:
+    bool& _held;
+};
+
+TEST_F(Resource, DeletesWhenItsMutexIsFree) {
+    bool held = true;
+    AsksAtItsEnd* const object = new AsksAtItsEnd(held);
+    object->_ref();
+    object->_unref();
+    EXPECT_EQ(object->_unref(), 0l);
+    EXPECT_FALSE(held);
 }
 
 TEST_F(Resource, UnrefBelowZeroGoesUnnoticed) {
