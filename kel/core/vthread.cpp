@@ -43,6 +43,10 @@ bool outlives_exit(const KELIMutex* mutex) {
 
 }  // namespace
 
+// These mutexes are zero before they are built and stay as they are when they are destroyed. Both times
+// they can be locked, while a sanitizer would find no object there.
+#define KEL_OBJECT_OR_NOT __attribute__((no_sanitize("vptr")))
+
 // --- mutexes -----------------------------------------------------------------------------------------
 
 KELIMutex::~KELIMutex() = default;
@@ -59,14 +63,14 @@ KELMutex::~KELMutex() {
 void KELMutex::v_lock() { lock(); }
 void KELMutex::v_unlock() { unlock(); }
 
-void KELMutex::lock() {
+KEL_OBJECT_OR_NOT void KELMutex::lock() {
     const int rc = pthread_mutex_lock(&_mutex);
     if (rc != 0) use_failed("pthread_mutex_lock", "(rc == 0)", __LINE__, "void KELMutex::lock()");
 }
 
 // Deliberate: a failed unlock is headed by the name of the lock call; log filters look for that line.
 // Pinned by Mutex.FailedUnlockNamesTheLockCall.
-void KELMutex::unlock() {
+KEL_OBJECT_OR_NOT void KELMutex::unlock() {
     const int rc = pthread_mutex_unlock(&_mutex);
     if (rc != 0) use_failed("pthread_mutex_lock", "(rc == 0)", __LINE__, "void KELMutex::unlock()");
 }
@@ -91,59 +95,55 @@ KELRMutex::~KELRMutex() {
 void KELRMutex::v_lock() { lock(); }
 void KELRMutex::v_unlock() { unlock(); }
 
-void KELRMutex::lock() {
+KEL_OBJECT_OR_NOT void KELRMutex::lock() {
     const int rc = pthread_mutex_lock(&_mutex);
     if (rc != 0) use_failed("pthread_mutex_lock", "(rc == 0)", __LINE__, "void KELRMutex::lock()");
 }
 
-void KELRMutex::unlock() {
+KEL_OBJECT_OR_NOT void KELRMutex::unlock() {
     const int rc = pthread_mutex_unlock(&_mutex);
     if (rc != 0) use_failed("pthread_mutex_unlock", "(rc == 0)", __LINE__, "void KELRMutex::unlock()");
 }
 
 // --- guards ------------------------------------------------------------------------------------------
 
-// Threads that still run after exit began hold the mutexes of outlives_exit() through these guards. A
-// sanitizer would find their objects destroyed.
-#define KEL_ON_DESTROYED_TOO __attribute__((no_sanitize("vptr")))
-
 // Deliberate: the flag does not decide whether the guard locks. With 0 the mutex stays locked when the
 // guard is gone: that is how a scope hands a locked mutex over to its caller.
 // Pinned by MutexGuard.FlagZeroLeavesTheMutexLocked.
-KEL_ON_DESTROYED_TOO KELMutex_var::KELMutex_var(KELMutex& m, unsigned char flag) : _mtx(m), _locked(flag) {
+KEL_OBJECT_OR_NOT KELMutex_var::KELMutex_var(KELMutex& m, unsigned char flag) : _mtx(m), _locked(flag) {
     m.lock();
 }
 
-KEL_ON_DESTROYED_TOO KELMutex_var::~KELMutex_var() {
+KEL_OBJECT_OR_NOT KELMutex_var::~KELMutex_var() {
     if (_locked) _mtx.unlock();
 }
 
 // Deliberate: the flag is not looked at first. A guard with flag 0 may have handed its mutex over, so the
 // flag does not tell whether the mutex is held. Pinned by MutexGuard.LockDoesNotTestTheFlag.
-KEL_ON_DESTROYED_TOO void KELMutex_var::lock() {
+KEL_OBJECT_OR_NOT void KELMutex_var::lock() {
     _mtx.lock();
     _locked = 1;
 }
 
-KEL_ON_DESTROYED_TOO void KELMutex_var::unlock() {
+KEL_OBJECT_OR_NOT void KELMutex_var::unlock() {
     _mtx.unlock();
     _locked = 0;
 }
 
-KEL_ON_DESTROYED_TOO KELRMutex_var::KELRMutex_var(KELRMutex& m, unsigned char flag) : _mtx(m), _locked(flag) {
+KEL_OBJECT_OR_NOT KELRMutex_var::KELRMutex_var(KELRMutex& m, unsigned char flag) : _mtx(m), _locked(flag) {
     m.lock();
 }
 
-KEL_ON_DESTROYED_TOO KELRMutex_var::~KELRMutex_var() {
+KEL_OBJECT_OR_NOT KELRMutex_var::~KELRMutex_var() {
     if (_locked) _mtx.unlock();
 }
 
-KEL_ON_DESTROYED_TOO void KELRMutex_var::lock() {
+KEL_OBJECT_OR_NOT void KELRMutex_var::lock() {
     _mtx.lock();
     _locked = 1;
 }
 
-KEL_ON_DESTROYED_TOO void KELRMutex_var::unlock() {
+KEL_OBJECT_OR_NOT void KELRMutex_var::unlock() {
     _mtx.unlock();
     _locked = 0;
 }

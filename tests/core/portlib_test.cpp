@@ -10,7 +10,7 @@
 #include <cstring>
 #include <type_traits>
 
-#include "tests/support/child.h"
+#include "tests/core/fresh.h"
 
 namespace {
 
@@ -32,7 +32,8 @@ __attribute__((constructor(101))) void print_initial_values() {
 }
 
 TEST_F(PortLib, HoldsItsValuesBeforeAnythingRuns) {
-    const auto seen = kel::test::run_program({program_invocation_name}, {"KEL_PRINT_INITIAL_VALUES=1"});
+    const auto seen = kel::test::run_program(
+        {program_invocation_name}, {"KEL_PRINT_INITIAL_VALUES=1", kel::test::exit_in_an_initialiser});
     EXPECT_EQ(seen.out, "0 0 eth0");
 }
 

@@ -6,6 +6,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <deque>
 #include <string>
 #include <vector>
 
@@ -282,7 +283,7 @@ protected:
 
     template <class E>
     E fails(int error) {
-        net.accepts = {error};
+        net.accepts = std::deque<int>{error};
         return thrown<E>([this] { KELPortable::socketAccept(server); });
     }
 
