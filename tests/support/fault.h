@@ -5,6 +5,8 @@
 //   Armed               while one lives, this thread's calls are counted and judged
 //   ArmedEverywhere     the same for every thread of the process
 //   Disarmed            a pause inside an armed scope
+//   CallTrace           while one lives, armed calls are listed in their order
+//   all_seams           every seam there is
 //   AllocationPlan      the same for operator new
 //
 //     seams::listen.fail(1, EACCES);                       // the first armed call fails
@@ -27,6 +29,7 @@
 #include <functional>
 #include <type_traits>
 #include <utility>
+#include <vector>
 
 namespace kel {
 namespace test {
@@ -39,6 +42,7 @@ namespace test {
 enum class Failing {
     minus_one_and_errno,  // returns -1 (null for a pointer) and sets errno
     returned_code,        // returns the error; errno stays as the test preset it
+    zero_and_errno,       // returns 0 and sets errno
 };
 
 KEL_TEST_BEFORE_SANITIZER bool armed();
@@ -86,14 +90,32 @@ public:
         _persistent = from_then_on;
     }
 
+    // The `nth` armed call fails as well, with an error of its own.
+    void fail_too(long nth, int error) {
+        _second_nth = nth;
+        _second_error = error;
+    }
+
+    void forget_calls() { _calls = 0; }
+
+    // What a failing call that returns its error leaves in errno; without this errno stays as it is.
+    void leave_errno(int value) { _left_errno = value; }
+
+    // A failing call does its work all the same, as close() does.
+    void fail_after_the_work() { _works = true; }
+
 protected:
     KEL_TEST_BEFORE_SANITIZER bool fails_at(long n) const {
-        return _nth != 0 && (n == _nth || (_persistent && n > _nth));
+        return n == _second_nth || (_nth != 0 && (n == _nth || (_persistent && n > _nth)));
     }
+    int error_of(long n) const { return n == _second_nth ? _second_error : _error; }
     void forget() {
         _calls = 0;
         _nth = 0;
         _persistent = false;
+        _second_nth = 0;
+        _left_errno = -1;
+        _works = false;
     }
 
     const char* _name;
@@ -102,7 +124,42 @@ protected:
     long _nth = 0;
     int _error = 0;
     bool _persistent = false;
+    long _second_nth = 0;
+    int _second_error = 0;
+    int _left_errno = -1;
+    bool _works = false;
 };
+
+// In the order of seams.inc.
+const std::vector<SeamBase*>& all_seams();
+
+// Looks the system's calls up now, for callers that must not do it later: looking up allocates.
+void find_real_calls();
+
+// The armed calls of all threads while one lives, in their order. One lives at a time.
+class CallTrace {
+public:
+    struct Call {
+        SeamBase* seam;
+        long nth;
+    };
+
+    CallTrace();
+    ~CallTrace();
+    CallTrace(const CallTrace&) = delete;
+    CallTrace& operator=(const CallTrace&) = delete;
+
+    // Forgets the calls so far, and the counts of all seams and of the allocation plan: what follows is
+    // counted from 1.
+    void restart();
+
+    // No more calls are listed.
+    void stop();
+
+    std::vector<Call> calls() const;
+};
+
+KEL_TEST_BEFORE_SANITIZER void trace_call(SeamBase& seam, long nth);
 
 template <class Signature>
 class Seam;
@@ -118,49 +175,74 @@ public:
         _script = new std::function<R(A...)>(std::move(answer));
     }
 
+    // A failing call is answered by `tell`, which gets the error first: for calls that tell a failure
+    // by more than their result and errno.
+    void tell_failure(std::function<R(int, A...)> tell) {
+        delete _tell;
+        _tell = new std::function<R(int, A...)>(std::move(tell));
+    }
+
     // The system's own call.
-    KEL_TEST_BEFORE_SANITIZER R real(A... a) {
+    KEL_TEST_BEFORE_SANITIZER R real(A... a) { return reinterpret_cast<R (*)(A...)>(find_real())(a...); }
+
+    KEL_TEST_BEFORE_SANITIZER void* find_real() {
         void* found = __atomic_load_n(&_real, __ATOMIC_RELAXED);
         if (found == nullptr) {
             found = dlsym(RTLD_NEXT, _name);
             __atomic_store_n(&_real, found, __ATOMIC_RELAXED);
         }
-        return reinterpret_cast<R (*)(A...)>(found)(a...);
+        return found;
     }
 
     // What the interposed symbol does.
     KEL_TEST_BEFORE_SANITIZER R call(A... a) {
         if (!armed()) return real(a...);
         const long n = __atomic_add_fetch(&_calls, 1, __ATOMIC_RELAXED);
-        if (fails_at(n)) return failure();
-        if (_script != nullptr) {
-            Disarmed pause;
-            return (*_script)(a...);
-        }
-        return real(a...);
+        trace_call(*this, n);
+        return fails_at(n) ? failure(error_of(n), a...) : answer(a...);
     }
 
     void reset() {
         forget();
         delete _script;
         _script = nullptr;
+        delete _tell;
+        _tell = nullptr;
     }
 
 private:
-    KEL_TEST_BEFORE_SANITIZER R failure() {
+    KEL_TEST_BEFORE_SANITIZER R answer(A... a) {
+        if (_script == nullptr) return real(a...);
+        Disarmed pause;
+        return (*_script)(a...);
+    }
+
+    KEL_TEST_BEFORE_SANITIZER R failure(int error, A... a) {
+        if (_works) answer(a...);
+        if (_how == Failing::returned_code && _left_errno >= 0) errno = _left_errno;
+        if (_tell != nullptr) {
+            Disarmed pause;
+            return (*_tell)(error, a...);
+        }
         if constexpr (std::is_void_v<R>) {
             return;
-        } else if constexpr (std::is_pointer_v<R>) {
-            errno = _error;
+        } else {
+            if (_how != Failing::returned_code) errno = error;
+            return failing_result(error);
+        }
+    }
+
+    KEL_TEST_BEFORE_SANITIZER R failing_result([[maybe_unused]] int error) {
+        if constexpr (std::is_pointer_v<R>) {
             return nullptr;
         } else {
-            if (_how == Failing::returned_code) return static_cast<R>(_error);
-            errno = _error;
-            return static_cast<R>(-1);
+            if (_how == Failing::returned_code) return static_cast<R>(error);
+            return static_cast<R>(_how == Failing::zero_and_errno ? 0 : -1);
         }
     }
 
     std::function<R(A...)>* _script = nullptr;
+    std::function<R(int, A...)>* _tell = nullptr;
     void* _real = nullptr;
 };
 

@@ -4,6 +4,8 @@
 // SPDX-License-Identifier: MIT
 #include "tests/support/seams.h"
 
+#include <algorithm>
+
 namespace kel {
 namespace test {
 
@@ -13,9 +15,15 @@ thread_local int armed_here = 0;
 thread_local int paused_here = 0;
 int armed_everywhere = 0;
 
+// In static storage, because tracing must not allocate. Calls beyond it are not listed.
+CallTrace::Call traced[16384];
+long traced_count = 0;
+bool tracing = false;
+
 }  // namespace
 
-void reset_allocation_plan();  // in seams_new.cpp
+void reset_allocation_plan();   // in seams_new.cpp
+void reset_allocation_count();  // the same
 
 bool armed() {
     return paused_here == 0 && (armed_here != 0 || __atomic_load_n(&armed_everywhere, __ATOMIC_RELAXED) != 0);
@@ -27,6 +35,32 @@ ArmedEverywhere::ArmedEverywhere() { __atomic_add_fetch(&armed_everywhere, 1, __
 ArmedEverywhere::~ArmedEverywhere() { __atomic_sub_fetch(&armed_everywhere, 1, __ATOMIC_RELAXED); }
 Disarmed::Disarmed() { ++paused_here; }
 Disarmed::~Disarmed() { --paused_here; }
+
+void trace_call(SeamBase& seam, long nth) {
+    if (!__atomic_load_n(&tracing, __ATOMIC_RELAXED)) return;
+    const long i = __atomic_fetch_add(&traced_count, 1, __ATOMIC_RELAXED);
+    if (i < static_cast<long>(sizeof traced / sizeof traced[0])) traced[i] = {&seam, nth};
+}
+
+CallTrace::CallTrace() {
+    __atomic_store_n(&traced_count, 0, __ATOMIC_RELAXED);
+    __atomic_store_n(&tracing, true, __ATOMIC_RELAXED);
+}
+
+CallTrace::~CallTrace() { stop(); }
+
+void CallTrace::stop() { __atomic_store_n(&tracing, false, __ATOMIC_RELAXED); }
+
+void CallTrace::restart() {
+    __atomic_store_n(&traced_count, 0, __ATOMIC_RELAXED);
+    for (SeamBase* seam : all_seams()) seam->forget_calls();
+    reset_allocation_count();
+}
+
+std::vector<CallTrace::Call> CallTrace::calls() const {
+    const long listed = static_cast<long>(sizeof traced / sizeof traced[0]);
+    return {traced, traced + std::min(__atomic_load_n(&traced_count, __ATOMIC_RELAXED), listed)};
+}
 
 namespace seams {
 
@@ -43,6 +77,21 @@ namespace seams {
 #undef KEL_SEAM
 
 }  // namespace seams
+
+const std::vector<SeamBase*>& all_seams() {
+    static const std::vector<SeamBase*> all = {
+#define KEL_SEAM(result, name, parameters, arguments, how) &seams::name,
+#include "tests/support/seams.inc"
+#undef KEL_SEAM
+    };
+    return all;
+}
+
+void find_real_calls() {
+#define KEL_SEAM(result, name, parameters, arguments, how) seams::name.find_real();
+#include "tests/support/seams.inc"
+#undef KEL_SEAM
+}
 
 void reset_faults() {
 #define KEL_SEAM(result, name, parameters, arguments, how) seams::name.reset();

@@ -47,6 +47,10 @@ void release(void* block) {
 }  // namespace
 
 void reset_allocation_plan();
+void reset_allocation_count();
+
+void reset_allocation_count() { plan_calls = 0; }
+
 void reset_allocation_plan() {
     plan_calls = 0;
     plan_nth = 0;
