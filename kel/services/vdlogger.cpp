@@ -244,7 +244,7 @@ void KELDebugLogger::setTrimSize(unsigned int kb) {
 }
 
 // Whatever fails here is tried again 500 headers later. A cut backup name would be another file, so a
-// name that is too long leaves the log as it is.
+// name that is too long leaves the log as it is. The negative length of a failure is too long as well.
 void KELDebugLogger::trimLog() {
     KELRMutex_var hold(*this, 1);
     if (!is_open() || _fd == -1 || (flag() & trim_bit) == 0) return;
@@ -252,7 +252,7 @@ void KELDebugLogger::trimLog() {
     if (fstat(_fd, &log) != 0 || log.st_size < read_word(_trim_size)) return;
     char backup[name_limit + 1];
     const int length = std::snprintf(backup, sizeof backup, "%so", _file_name);
-    if (length < 0 || static_cast<std::size_t>(length) > name_limit) return;
+    if (static_cast<std::size_t>(length) > name_limit) return;
     unlink(backup);
     closeFile();
     if (_pending == 0) return;  // the log could not be closed: it keeps its name
