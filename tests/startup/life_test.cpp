@@ -9,6 +9,7 @@
 namespace {
 
 using kel::test::Outcome;
+using kel::test::round_environment;
 using kel::test::start;
 
 // The lines of `o` without the headers of the log, whose time differs.
@@ -63,7 +64,17 @@ TEST(StaticObjects, AreDestroyedWhenTheirLibraryIsClosed) {
     EXPECT_EQ(o.exit_code, 0);
 }
 
+// Each time in a process of its own: a library that stays is closed in earnest only once.
 TEST(Unload, ThreadsMayBeInsideWhenTheLibraryIsClosed) {
+    for (int i = 0; i < 200; ++i) {
+        const Outcome o = start({"unload", KEL_STARTUP_LIBRARY, "1"}, round_environment(i));
+        ASSERT_EQ(o.err, "") << "round " << i;
+        ASSERT_EQ(o.signal, 0) << "round " << i;
+        ASSERT_EQ(o.exit_code, 0) << "round " << i;
+    }
+}
+
+TEST(Unload, LibraryMayBeOpenedAndClosedManyTimes) {
     const Outcome o = start({"unload", KEL_STARTUP_LIBRARY, "200"}, {"DEBUG_STATIC"});
     EXPECT_EQ(o.err, "");
     EXPECT_EQ(o.signal, 0);
