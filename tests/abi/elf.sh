@@ -4,10 +4,12 @@
 #     elf.sh TEST LIBRARY [ARGUMENT...]
 #
 # `elf.sh exported LIBRARY` prints the exported symbols, sorted: the form of exports-32.txt and
-# exports-64.txt.
+# exports-64.txt. `elf.sh described LIBRARY` prints the types and functions that users see, as abidw
+# reads them from the debug information: the form of types-32.abi.gz and types-64.abi.gz.
 set -euo pipefail
 export LC_ALL=C
 
+top=$(cd "$(dirname "$0")/../.." && pwd -P)  # as the debug information spells it
 library=$2
 readelf --file-header "$library" >/dev/null  # what cannot be read lacks every bad thing
 
@@ -46,6 +48,49 @@ exports_are_the_listed_ones() {
         return 1
     fi
     wc -l <"$1"
+}
+
+public_headers() { find "$top/kel" \( -name '*.h' -o -name '*.inc' \) ! -path '*/internal/*' | sort; }
+
+# A type that no public header defines is the library's own business.
+described() {
+    local header headers=()
+    for header in $(public_headers); do
+        headers+=(--header-file "$header")
+    done
+    abidw --no-show-locs --no-corpus-path --no-comp-dir-path --type-id-style hash \
+        --drop-private-types --exported-interfaces-only "${headers[@]}" "$library" | sed "s|path='$top/|path='|"
+}
+
+# abidiff tells what differs between the baseline $1 and the library, harmless or not.
+types_are_those_of_the_baseline() {
+    gzip -dc "$1" >baseline.abi
+    described >described.abi
+    abidiff --harmless --no-default-suppression baseline.abi described.abi
+    echo "$(sed -n "s/^.*<class-decl \(name='[^']*' size-in-bits\).*/\1/p" described.abi | sort -u | wc -l) classes"
+}
+
+# The file $1 says how many words each table of virtual operations has: two more than operations, and
+# several of such tables in a row for a class with a virtual base.
+virtual_tables_have_their_length() {
+    local bytes=$(($2 / 8)) name size
+    nm --dynamic --defined-only --format=posix "$library" | sed -n 's/^_ZTV\([^ ]*\) .* \([0-9a-f]*\)$/\1 \2/p' |
+        while read -r name size; do
+            echo "$((0x$size / bytes)) $(c++filt --types "$name")"
+        done | sort -k 2 | diff "$1" -
+    wc -l <"$1"
+}
+
+# Each class of a public header is named in $1, whose assertions the compiler holds.
+classes_have_their_layout_asserted() {
+    local class classes
+    # shellcheck disable=SC2046  # a list of words
+    classes=$(sed -nE '/##/d; s/^ *(class|struct) KEL_API ([A-Z_]+(\("[a-z]+"\))? )?(KEL[A-Za-z]+::)?([A-Za-z_]+).*/\5/p' \
+        $(public_headers))
+    for class in $classes; do
+        claim "$class has no assertion in $(basename "$1")" grep -E "^SIZE\(([A-Za-z_]+::)?$class," "$1"
+    done
+    echo "$(wc -w <<<"$classes") classes"
 }
 
 soname_carries_the_major_version() {
