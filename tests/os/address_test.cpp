@@ -400,6 +400,9 @@ TEST_F(SocketAddress, OnlyOneIPv6AddressIsLoopback) {
     EXPECT_TRUE(is_loopback(AF_INET6, "::1"));
     EXPECT_FALSE(is_loopback(AF_INET6, "::"));
     EXPECT_FALSE(is_loopback(AF_INET6, "::2"));
+    EXPECT_FALSE(is_loopback(AF_INET6, "0:0:0:0:1::1"));
+    EXPECT_FALSE(is_loopback(AF_INET6, "0:0:1::1"));
+    EXPECT_FALSE(is_loopback(AF_INET6, "1::1"));
     EXPECT_FALSE(is_loopback(AF_INET6, "::ffff:127.0.0.1"));
 }
 

@@ -277,6 +277,12 @@ TEST_F(Locality, StrongTestKnowsTheIPv6Loopback) {
     EXPECT_EQ(strong_test_of("loop"), "1");
 }
 
+TEST_F(Locality, StrongTestLooksAtEveryPartOfAnIPv6Address) {
+    for (const char* almost : {"::2", "0:0:0:0:1::1", "0:0:1::1", "1::1"}) {
+        EXPECT_EQ(strong_test_of(almost), "0") << almost;
+    }
+}
+
 TEST_F(Locality, StrongTestComparesIPv6Addresses) {
     EXPECT_EQ(strong_test_of("2001:db8::7"), "1");
     EXPECT_EQ(strong_test_of("alias"), "1");

@@ -1,0 +1,65 @@
+# shellcheck shell=bash
+# Memory and descriptors at 32 bit, as valgrind sees them: each test program in one process, without a
+# list of suppressions.
+
+# Programs whose tests start other programs, which valgrind does not follow.
+starts_others='test_(startup|examples|services_driver)'
+
+# Tests that would take all the time, with millions of operations or gigabytes that are looked at byte
+# by byte, and one that uses up the descriptors, of which valgrind keeps some for itself.
+not_for_memcheck='-DictionaryModel.*'
+not_for_memcheck+=':QuotedString.WithoutAnEndFillsTheLargestRoomThatThereIs'
+not_for_memcheck+=':Pipe.WithNoDescriptorsLeftThrowsNoResourcesWithEmfile'
+
+# Runs test program $1. What valgrind says goes to build/memcheck/<program>.valgrind, what the tests say
+# beside it. The program's own operator new is left to it, as tests make it fail. Children that end in
+# the middle of a test are watched but tell nothing at their end.
+under_memcheck() {
+    local name log
+    name=$(basename "$1")
+    log=$PWD/build/memcheck/$name
+    (cd "$(dirname "$1")" && valgrind --tool=memcheck --soname-synonyms=somalloc=nouserintercepts \
+        --leak-check=full --show-leak-kinds=definite --errors-for-leak-kinds=definite --track-fds=yes \
+        --child-silent-after-fork=yes --num-callers=30 --log-file="$log.valgrind" \
+        "./$name" --gtest_brief=1 --gtest_filter="$not_for_memcheck") </dev/null >"$log.tests" 2>&1 ||
+        grep -aE "FAILED|Failure" "$log.tests" || echo "$name did not come to its end"
+}
+
+# The sum of the numbers that the expression $1 finds in the files $2.
+sum_of() {
+    local expression=$1
+    shift
+    sed -nE "s/.*$expression.*/\1/p" "$@" | awk '{ sum += $1 } END { print sum + 0 }'
+}
+
+# Descriptors that are open at the end and were not at the beginning, in the files $@.
+left_open() {
+    awk '/ Open (file descriptor|AF_)/ { ++open } /<inherited from parent>/ { --open } END { print open + 0 }' "$@"
+}
+
+memcheck() {
+    local logs=build/memcheck programs failed errors tests passed left
+    { cmake --preset x86 && cmake --build --preset x86 --parallel "$(nproc)"; } >build/memcheck.build.log 2>&1 || {
+        cat build/memcheck.build.log
+        return 1
+    }
+    rm -rf $logs
+    mkdir -p $logs
+    export not_for_memcheck
+    export -f under_memcheck
+    mapfile -t programs < <(find build/x86/tests -type f -executable -name 'test_*' | grep -vE "/$starts_others\$" | sort)
+    # shellcheck disable=SC2016  # the inner shell expands it
+    failed=$(printf '%s\0' "${programs[@]}" |
+        xargs -0 -n 1 -P "$(nproc)" bash -c 'under_memcheck "$1"' -)
+    [ -z "$failed" ] || echo "$failed"
+    tests=$(sum_of '\] ([0-9]+) tests? from .* ran\.' $logs/*.tests)
+    passed=$(sum_of '  PASSED  \] ([0-9]+) test' $logs/*.tests)
+    errors=$(sum_of 'ERROR SUMMARY: ([0-9]+) errors' $logs/*.valgrind)
+    left=$(left_open $logs/*.valgrind)
+    [ "$errors" -eq 0 ] || grep -ahE -A 12 '^==[0-9]+== (Invalid|Conditional|Use of|Syscall|Mismatched|[0-9,]+ .* definitely)' \
+        $logs/*.valgrind | cut -c 1-160 | head -n 200
+    [ "$left" -eq 0 ] || grep -ahE -A 12 ' Open (file descriptor|AF_)' $logs/*.valgrind | cut -c 1-160 | head -n 200
+    echo "memcheck: $passed of $tests tests passed in ${#programs[@]} programs, $errors errors and definite leaks," \
+        "$left descriptors left open"
+    [ -z "$failed" ] && [ "$errors" -eq 0 ] && [ "$left" -eq 0 ]
+}
