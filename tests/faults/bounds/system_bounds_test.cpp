@@ -129,25 +129,25 @@ void read_with_little_room(std::uint32_t n, Write write, Read read) {
 }  // namespace
 
 AT_BOUNDS(Condition, AddsSecondsToTheTimeOfDay, condition_header, "seconds") {
-    expect_seconds(deadline_of([&](KELCondition& c, KELMutex& m) KEL_REQUIRES(m) {
+    expect_seconds(deadline_of([&](KELCondition& c, KELMutex& m) KEL_NO_THREAD_SAFETY_ANALYSIS {
                        EXPECT_EQ(c.timedwait(m, static_cast<unsigned long>(n)), 1);
                    }),
                    n);
 }
 AT_BOUNDS(ThrowingCondition, AddsSecondsToTheTimeOfDay, condition_header, "seconds") {
-    expect_seconds(deadline_of([&](KELCondition& c, KELMutex& m) KEL_REQUIRES(m) {
+    expect_seconds(deadline_of([&](KELCondition& c, KELMutex& m) KEL_NO_THREAD_SAFETY_ANALYSIS {
                        EXPECT_THROW(c.wait(m, static_cast<unsigned long>(n)), CORBA_TIMEOUT);
                    }),
                    n);
 }
 AT_BOUNDS(Condition, AddsMillisecondsToTheTimeOfDay, condition_header, "milliseconds") {
-    expect_milliseconds(deadline_of([&](KELCondition& c, KELMutex& m) KEL_REQUIRES(m) {
+    expect_milliseconds(deadline_of([&](KELCondition& c, KELMutex& m) KEL_NO_THREAD_SAFETY_ANALYSIS {
                             EXPECT_EQ(c.timedwait(m, static_cast<unsigned long long>(n)), 1);
                         }),
                         n);
 }
 AT_BOUNDS(ThrowingCondition, AddsMillisecondsToTheTimeOfDay, condition_header, "milliseconds") {
-    expect_milliseconds(deadline_of([&](KELCondition& c, KELMutex& m) KEL_REQUIRES(m) {
+    expect_milliseconds(deadline_of([&](KELCondition& c, KELMutex& m) KEL_NO_THREAD_SAFETY_ANALYSIS {
                             EXPECT_THROW(c.wait(m, static_cast<unsigned long long>(n)), CORBA_TIMEOUT);
                         }),
                         n);

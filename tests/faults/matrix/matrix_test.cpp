@@ -23,10 +23,12 @@ bool same(const Calls& a, const Calls& b) {
                       [](const auto& x, const auto& y) { return x.seam == y.seam && x.nth == y.nth; });
 }
 
-// Sanitizers look through a pipe whether an address can be read. Such a call is not the library's, which
-// makes pipes in one place only.
+// Sanitizers look through a pipe whether an address can be read, and ask for the stack of a thread that
+// throws or ends the process. Such calls are not the library's, which makes pipes in one place only and
+// attributes once for a thread.
 bool is_of_a_sanitizer(const CallTrace::Call& call, const Definition& definition, bool is_second) {
 #if defined(KEL_MATRIX_SANITIZED)
+    if (call.seam == &seams::pthread_attr_init) return call.nth > 1;
     return call.seam == &seams::pipe && (is_second || definition.name != "PipeIsMade");
 #else
     static_cast<void>(is_second);
