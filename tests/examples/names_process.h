@@ -53,7 +53,7 @@ public:
     std::vector<std::string> outcomes(const std::string& lines) const;
 
 private:
-    int end_with(int signal);
+    int end();  // waits for it
     int entries_of(const char* what) const;
 
     pid_t _process;
