@@ -22,19 +22,25 @@
 #define KEL_LOCAL __attribute__((visibility("hidden")))
 
 #if defined(__clang__)
+// An attribute of clang's analysis of locks; nothing to other compilers.
 #define KEL_THREAD_ANNOTATION(x) __attribute__((x))
 #else
 #define KEL_THREAD_ANNOTATION(x)
 #endif
 
+// A class that is a lock.
 #define KEL_CAPABILITY(x) KEL_THREAD_ANNOTATION(capability(x))
+// A class that holds a lock for a scope.
 #define KEL_SCOPED_CAPABILITY KEL_THREAD_ANNOTATION(scoped_lockable)
+// A field, and what a pointer points to, that only the holder of the lock may touch.
 #define KEL_GUARDED_BY(x) KEL_THREAD_ANNOTATION(guarded_by(x))
 #define KEL_PT_GUARDED_BY(x) KEL_THREAD_ANNOTATION(pt_guarded_by(x))
+// A function whose caller holds the lock, takes it, gives it back, does not hold it.
 #define KEL_REQUIRES(...) KEL_THREAD_ANNOTATION(requires_capability(__VA_ARGS__))
 #define KEL_ACQUIRE(...) KEL_THREAD_ANNOTATION(acquire_capability(__VA_ARGS__))
 #define KEL_RELEASE(...) KEL_THREAD_ANNOTATION(release_capability(__VA_ARGS__))
 #define KEL_EXCLUDES(...) KEL_THREAD_ANNOTATION(locks_excluded(__VA_ARGS__))
+// A function whose use of locks the analysis cannot follow.
 #define KEL_NO_THREAD_SAFETY_ANALYSIS KEL_THREAD_ANNOTATION(no_thread_safety_analysis)
 
 // Object layouts, slot order and the numbers on the wire rest on these.

@@ -77,16 +77,21 @@ private:
 template <class K, class V, class PoolHead>
 class HashTable {
 public:
+    // An entry.
     struct Assoc {
+        // Must not be changed while the entry is in the table.
         K _key;
+        // May be changed in place.
         V _value;
     };
 
+    // Called with copies of the key and the value of an entry that is about to be removed.
     typedef void (*RemoveCallback)(K, V);
 
     // Stands before slot 0 until it is advanced. Changing the table invalidates it.
     class Iterator {
     public:
+        // Begins before slot 0 of `table`, which must outlive the iterator.
         explicit Iterator(HashTable& table) : _dictionary(&table), _entry(0), _index(kBeforeFirst) {}
 
         // Moves on to the next record and returns it; null when there is none left. One that has
@@ -120,7 +125,9 @@ public:
     HashTable(const HashTable&) = delete;
     HashTable& operator=(const HashTable&) = delete;
 
+    // The number of slots.
     unsigned long capacity() const { return _capacity; }
+    // The number of entries.
     unsigned long count() const { return _count; }
 
     // The slot that holds `k` or, when it is absent, the empty slot into which it would go.
@@ -224,6 +231,7 @@ public:
     }
 
 protected:
+    // The slots for `n` by the rule of setCapacity. Throws std::bad_alloc.
     HashTable(unsigned long n, RemoveCallback on_remove)
         : _capacity(0),
           _count(0),
@@ -244,6 +252,7 @@ protected:
         while (_pool_head._free_count > 0) delete _pool[--_pool_head._free_count];
     }
 
+    // The part in which the two tables differ.
     PoolHead& pool_head() { return _pool_head; }
 
 private:
@@ -428,8 +437,10 @@ class KELDictionary : public kel::internal::HashTable<K, V, kel::internal::Plain
     typedef kel::internal::HashTable<K, V, kel::internal::PlainPoolHead> Table;
 
 public:
+    // Hears of an entry that is about to be removed: void (*)(K key, V value).
     typedef typename Table::RemoveCallback RemoveCallback;
 
+    // An empty table. Throws std::bad_alloc.
     explicit KELDictionary(unsigned long slots = 16, RemoveCallback on_remove = 0)
         : Table(slots, on_remove) {}
 };
@@ -442,8 +453,10 @@ class KELDictionary_r : public kel::internal::HashTable<K, V, kel::internal::Loc
     typedef kel::internal::HashTable<K, V, kel::internal::LockedPoolHead> Table;
 
 public:
+    // Hears of an entry that is about to be removed: void (*)(K key, V value).
     typedef typename Table::RemoveCallback RemoveCallback;
 
+    // An empty table and a free lock. Throws std::bad_alloc, or what KELRWLock throws.
     explicit KELDictionary_r(unsigned long slots = 16, RemoveCallback on_remove = 0)
         : Table(slots, on_remove) {}
 
@@ -452,6 +465,7 @@ public:
         this->removeAll();
     }
 
+    // The lock, for the owner to take.
     KELRWLock& rwlock() { return this->pool_head()._rwlock; }
 };
 

@@ -133,6 +133,7 @@ public:
     // refused with CORBA::MARSHAL (0). One choice for the process, made before strings are read.
     static void allowing_null_string(unsigned char on) { _allowing_null_string = on; }
 
+    // What allowing_null_string() stored.
     static unsigned char _allowing_null_string;
 
 private:
@@ -149,10 +150,12 @@ private:
 // anything else as a copy.
 class KEL_API CORBA_String_out {
 public:
+    // Refers to `p`, or to what `holder` or `other` refers to; only the last keeps what is there.
     CORBA_String_out(char*& p) : _ptr(p) { _ptr = 0; }
     CORBA_String_out(CORBA_String_var& holder) : _ptr(holder.out()) {}
     CORBA_String_out(const CORBA_String_out& other) : _ptr(other._ptr) {}
 
+    // Stores what `other` refers to, without a copy.
     CORBA_String_out& operator=(const CORBA_String_out& other) {
         _ptr = other._ptr;
         return *this;
@@ -162,6 +165,7 @@ public:
         _ptr = p;
         return *this;
     }
+    // Stores a copy of `s`; std::bad_alloc when there is no memory.
     CORBA_String_out& operator=(const char* s) {
         _ptr = CORBA::string_dup(s);
         return *this;
@@ -169,6 +173,7 @@ public:
     // The string would have two owners.
     CORBA_String_out& operator=(const CORBA_String_var&) = delete;
 
+    // The pointer that it refers to.
     operator char*&() { return _ptr; }
     char*& ptr() { return _ptr; }
 
@@ -183,8 +188,10 @@ private:
 // of its own.
 class KEL_API KELStringWrapper {
 public:
+    // Borrows `s`, which may be null.
     KELStringWrapper(const char* s) : _ptr(s) {}
 
+    // The borrowed string.
     const char* in() const { return _ptr; }
 
 private:

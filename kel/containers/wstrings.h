@@ -108,10 +108,12 @@ private:
 // itself, anything else as a copy.
 class KEL_API CORBA_WString_out {
 public:
+    // Refers to `p`, or to what `holder` or `other` refers to; only the last keeps what is there.
     CORBA_WString_out(wchar_t*& p) : _ptr(p) { _ptr = 0; }
     CORBA_WString_out(CORBA_WString_var& holder) : _ptr(holder.out()) {}
     CORBA_WString_out(const CORBA_WString_out& other) : _ptr(other._ptr) {}
 
+    // Stores what `other` refers to, without a copy.
     CORBA_WString_out& operator=(const CORBA_WString_out& other) {
         _ptr = other._ptr;
         return *this;
@@ -121,6 +123,7 @@ public:
         _ptr = p;
         return *this;
     }
+    // Stores a copy of `s`; std::bad_alloc when there is no memory.
     CORBA_WString_out& operator=(const wchar_t* s) {
         _ptr = CORBA::wstring_dup(s);
         return *this;
@@ -128,6 +131,7 @@ public:
     // The string would have two owners.
     CORBA_WString_out& operator=(const CORBA_WString_var&) = delete;
 
+    // The pointer that it refers to.
     operator wchar_t*&() { return _ptr; }
     wchar_t*& ptr() { return _ptr; }
 

@@ -30,6 +30,7 @@ public:
     // No thread may be waiting any more: the system would wait for it.
     ~KELCondition();
 
+    // Frees the mutex, waits for signal() or broadcast() and takes it again. May end by chance.
     void wait(KELMutex& m) KEL_REQUIRES(m);
 
     // Wait at most so long. 1: the time is over, or a signal handler interrupted the wait.

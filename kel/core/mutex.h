@@ -41,7 +41,9 @@ public:
     void v_unlock() override KEL_RELEASE();
     ~KELMutex() override;
 
+    // Waits until no thread holds the mutex and takes it.
     void lock() KEL_ACQUIRE();
+    // Gives the mutex, which the calling thread holds, to the next one.
     void unlock() KEL_RELEASE();
 
 private:
@@ -57,7 +59,9 @@ public:
     void v_unlock() override KEL_RELEASE();
     ~KELRMutex() override;
 
+    // Waits until no other thread holds the mutex and takes it once more.
     void lock() KEL_ACQUIRE();
+    // Takes one lock() of this thread back; the last one frees the mutex.
     void unlock() KEL_RELEASE();
 
 private:
@@ -76,9 +80,12 @@ public:
 
     // Locks the mutex again after an unlock(). A second lock() in a row deadlocks.
     void lock() KEL_ACQUIRE();
+    // Unlocks the mutex before the end of the scope.
     void unlock() KEL_RELEASE();
+    // The mutex, whether or not the guard holds it.
     KELMutex* operator->() { return &_mtx; }
 
+    // The mutex, which is not owned.
     KELMutex& _mtx;
     unsigned char _locked;  // non-zero: the destructor unlocks
 };
@@ -91,10 +98,13 @@ public:
     KELRMutex_var& operator=(const KELRMutex_var&) = delete;
     ~KELRMutex_var() KEL_RELEASE();
 
+    // As for KELMutex_var.
     void lock() KEL_ACQUIRE();
     void unlock() KEL_RELEASE();
+    // The mutex, whether or not the guard holds it.
     KELRMutex* operator->() { return &_mtx; }
 
+    // The mutex, which is not owned.
     KELRMutex& _mtx;
     unsigned char _locked;  // non-zero: the destructor unlocks
 };
@@ -113,8 +123,10 @@ public:
 
     // Unlocks the mutex, if there is one, but keeps it attached.
     void unlock() KEL_NO_THREAD_SAFETY_ANALYSIS;
+    // The attached mutex, or null.
     KELMutex* operator->() { return _mtx; }
 
+    // The mutex that is attached, or null. Not owned.
     KELMutex* _mtx;
     unsigned char _locked;  // non-zero: the destructor unlocks
 };

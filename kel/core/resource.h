@@ -27,6 +27,7 @@ public:
     static void set_init_sharing(unsigned char on);
     static unsigned char get_init_sharing();
 
+    // What set_init_sharing() stored; read without a lock.
     static unsigned char _init_sharing;
 
 private:
@@ -93,6 +94,7 @@ public:
 
     virtual ~KELResource();
 
+    // The references there are: 1 while nobody has changed the count.
     unsigned long _num_refs();
 
     // Sets the count to 0 without locking.
@@ -101,6 +103,7 @@ public:
     // Switches the locking of this object's count on or off. Call it before the object is shared.
     void _set_sharing(unsigned char on);
 
+    // As KELResourceImpl::set_init_sharing().
     static void set_init_sharing(unsigned char on);
 
     // Deletes the parked records.

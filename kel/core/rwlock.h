@@ -24,7 +24,9 @@ public:
     KELRWLock(const KELRWLock&) = delete;
     KELRWLock& operator=(const KELRWLock&) = delete;
 
+    // Waits while a writer holds the lock or waits for it, then holds it with other readers.
     void read_lock() KEL_THREAD_ANNOTATION(acquire_shared_capability());
+    // Waits until nobody holds the lock, then holds it alone.
     void write_lock() KEL_ACQUIRE();
 
     // Releases whichever of the two the caller holds.
@@ -39,6 +41,7 @@ public:
 
 class KEL_API KEL_SCOPED_CAPABILITY KELRLock_var {
 public:
+    // Waits for the lock and holds it for reading. `lock` is not owned.
     explicit KELRLock_var(KELRWLock& lock) KEL_THREAD_ANNOTATION(acquire_shared_capability(lock));
     KELRLock_var(const KELRLock_var&) = delete;
     KELRLock_var& operator=(const KELRLock_var&) = delete;
@@ -51,6 +54,7 @@ private:
 
 class KEL_API KEL_SCOPED_CAPABILITY KELWLock_var {
 public:
+    // Waits for the lock and holds it for writing. `lock` is not owned.
     explicit KELWLock_var(KELRWLock& lock) KEL_ACQUIRE(lock);
     KELWLock_var(const KELWLock_var&) = delete;
     KELWLock_var& operator=(const KELWLock_var&) = delete;

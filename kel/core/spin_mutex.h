@@ -31,7 +31,9 @@ public:
     // Gives the mutex back. It must not be locked.
     ~KELSpinMutex() override;
 
+    // As lock() of the mutex that the handle stands for.
     void lock() KEL_ACQUIRE();
+    // As unlock() of the mutex that the handle stands for.
     void unlock() KEL_RELEASE();
 
 private:
@@ -46,7 +48,9 @@ public:
     void v_unlock() override KEL_RELEASE();
     ~KELRSpinMutex() override;
 
+    // As lock() of the mutex that the handle stands for.
     void lock() KEL_ACQUIRE();
+    // As unlock() of the mutex that the handle stands for.
     void unlock() KEL_RELEASE();
 
 private:

@@ -28,6 +28,7 @@
 // is one relaxed load or store.
 class KEL_API KELThreadId {
 public:
+    // Stands for the thread with this identifier of the system.
     KELThreadId(pthread_t id) : _id(id) {}
     KELThreadId(const KELThreadId& other) : _id(other.id()) {}
     KELThreadId& operator=(const KELThreadId& other) {
@@ -35,7 +36,9 @@ public:
         return *this;
     }
 
+    // The identifier of the system.
     pthread_t id() const { return __atomic_load_n(&_id, __ATOMIC_RELAXED); }
+    // Whether both stand for the same thread.
     bool operator==(const KELThreadId& other) const { return id() == other.id(); }
     bool operator!=(const KELThreadId& other) const { return id() != other.id(); }
 
@@ -45,6 +48,7 @@ private:
 
 // 0 when the identifiers are equal, otherwise their order as numbers.
 KEL_API int compare(const KELThreadId& a, const KELThreadId& b);
+// A number made of the identifier.
 KEL_API unsigned long _kel_hash(const KELThreadId& id);
 
 class KEL_API KELThread {
@@ -90,9 +94,11 @@ public:
     KELThreadId _tid;  // the creator's until the new thread puts its own here
     KELThread* _next;  // next older object of the registry
     KELThread* _prev;  // next newer object of the registry
+    // Bytes; 0 is the system's default.
     long _stacksize;
 
     static KELThread* _first KEL_GUARDED_BY(_mutex);  // the newest object
+    // Guards the registry.
     static KELMutex _mutex;
 
     // PTHREAD_INHERIT_SCHED or PTHREAD_EXPLICIT_SCHED for new threads; -1 sets no attribute.

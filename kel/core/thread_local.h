@@ -54,10 +54,13 @@ public:
     static void _exit_thread(void* arg);
 
     KELThreadId _owner;  // the thread that constructed the object
+    // The slot of its kind.
     unsigned long _slot;
 
+    // Guards the tables and the slots; held while objects are finalised.
     static KELRMutex _mutex;
     static pthread_key_t _key;  // its destructor is _exit_thread; created by the first construction
+    // What _dict_instance() made, or null.
     static ThreadTable* _key_dict KEL_GUARDED_BY(_mutex);
     static std::uint32_t _cnt KEL_GUARDED_BY(_mutex);  // the next free slot
 };

@@ -22,6 +22,7 @@ public:
     // Wraps `value`, so that a table can be asked for it, and draws none.
     KELUniqueId(unsigned long value) : _value(static_cast<std::uint32_t>(value)) {}
 
+    // The integer.
     unsigned long value() const { return _value; }
 
     static std::uint32_t _globalId;  // the next integer to be drawn
@@ -30,6 +31,7 @@ private:
     std::uint32_t _value;
 };
 
+// Whether the integers are equal.
 inline bool operator==(const KELUniqueId& a, const KELUniqueId& b) { return a.value() == b.value(); }
 inline bool operator!=(const KELUniqueId& a, const KELUniqueId& b) { return a.value() != b.value(); }
 

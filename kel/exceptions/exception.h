@@ -41,6 +41,7 @@ public:
     // class, so there is exactly one per class, with static storage.
     class KEL_API Description {
     public:
+        // Makes a default instance on the heap, which the caller releases with CORBA::release.
         typedef CORBA_Exception* (*Factory)();
 
         // Registers the description under `repository_id`. The texts are not copied and must
@@ -62,6 +63,8 @@ public:
 
         const char* name() const { return _name; }                    // "CORBA::BAD_PARAM"
         const char* repository_id() const { return _repository_id; }  // "IDL:omg.org/CORBA/BAD_PARAM:1.0"
+        // What was given to the constructor: the factory of an abstract class is null, and the base of
+        // the root.
         Factory factory() const { return _factory; }
         const Description* base() const { return _base; }
 
@@ -93,6 +96,7 @@ public:
     CORBA_Exception& operator=(const CORBA_Exception&) = default;
     virtual ~CORBA_Exception();
 
+    // The description of the object's own class.
     virtual const Description* _desc() const;
 
     // The body as it travels, without the repository id. Empty here.
@@ -112,12 +116,14 @@ public:
     virtual const char* _name() const;
     virtual const char* _repository_id() const;
 
+    // The description of this class.
     static Description _description;
 };
 
 // Owns an exception that was created on the heap; null is nothing to own.
 class KEL_API CORBA_Exception_var {
 public:
+    // Takes `e`, which may be null, over.
     CORBA_Exception_var(CORBA_Exception* e = nullptr) : _exception(e) {}
     ~CORBA_Exception_var();
 
@@ -127,9 +133,12 @@ public:
     // Deletes the held exception and adopts `e`. Adopting what is held already changes nothing.
     CORBA_Exception_var& operator=(CORBA_Exception* e);
 
+    // The held exception, which must not be null.
     CORBA_Exception* operator->() const { return _exception; }
 
+    // The held exception or null, for a callee that reads it.
     CORBA_Exception* in() const { return _exception; }
+    // The held pointer, for a callee that may release and replace the exception.
     CORBA_Exception*& inout() { return _exception; }
     CORBA_Exception*& out();   // deletes the held exception first
     CORBA_Exception* _retn();  // hands the exception over to the caller
@@ -141,6 +150,7 @@ private:
 // The base of every exception that an interface declares. `_raise` and `_deep_copy` stay pure.
 class KEL_API CORBA_UserException : public CORBA_Exception {
 public:
+    // The description of the object's own class.
     const Description* _desc() const override;
 
     // `e` as this class, or null when it is of another class or null.
@@ -148,6 +158,7 @@ public:
     static const CORBA_UserException* _downcast(const CORBA_Exception* e);
     static CORBA_UserException* _downcast(std::nullptr_t) { return nullptr; }
 
+    // The description of this class.
     static Description _description;
 };
 
@@ -155,16 +166,20 @@ public:
 // and never throws it itself.
 class KEL_API KELRemarshal : public CORBA_UserException {
 public:
+    // The description of the object's own class.
     const Description* _desc() const override;
     void _raise() const override;
     CORBA_Exception* _deep_copy() override;
 
+    // A KELRemarshal on the heap, released with CORBA::release.
     static CORBA_Exception* _factory();
 
+    // `e` as this class, or null when it is of another class or null.
     static KELRemarshal* _downcast(CORBA_Exception* e);
     static const KELRemarshal* _downcast(const CORBA_Exception* e);
     static KELRemarshal* _downcast(std::nullptr_t) { return nullptr; }
 
+    // The description of this class.
     static Description _description;
 };
 

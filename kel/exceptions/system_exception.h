@@ -32,6 +32,7 @@ namespace CORBA {
 // stays what it is.
 enum CompletionStatus : std::uint32_t { COMPLETED_YES = 0, COMPLETED_NO = 1, COMPLETED_MAYBE = 2 };
 
+// The set of minor codes that the OMG gives out: the upper twenty bits.
 const unsigned long OMGVMCID = 0x4f4d0000;
 
 }  // namespace CORBA
@@ -47,7 +48,8 @@ public:
     // Pinned by SystemException/MinorCodeRule.DecidesWhatInitStores.
     void init(unsigned long minor, CORBA::CompletionStatus completed);
 
-    // Set as given: the minor-code rule is left to the constructors and `init`.
+    // The minor code and the completion status, read and set as they are: the minor-code rule is left to
+    // the constructors and `init`.
     unsigned long minor() const { return _minor; }
     void minor(unsigned long code) { _minor = code; }
     CORBA::CompletionStatus completed() const { return _completed; }
@@ -57,9 +59,16 @@ public:
     const char* reason() const { return _reason.in(); }
     void reason(const char* text) { _reason = text; }
 
+    // The description of the object's own class.
     const Description* _desc() const override;
+
+    // The minor code and the completion status.
     void _write(KELostream& out) const override;
+
+    // Reads what _write wrote; the minor-code rule is not applied.
     void _copy(KEListream& in) override;
+
+    // The name, the explanation unless it is empty, the minor code and the completion status.
     void _pretty_print(KELostream& out) const override;
 
     // `e` as this class, or null when it is of another class or null.
@@ -67,6 +76,7 @@ public:
     static const CORBA_SystemException* _downcast(const CORBA_Exception* e);
     static CORBA_SystemException* _downcast(std::nullptr_t) { return nullptr; }
 
+    // The description of this class.
     static Description _description;
 
 private:
@@ -79,6 +89,8 @@ private:
 // the factory that copies it.
 class KEL_API KELStdException : public CORBA_SystemException {
 public:
+    // Minor code and status as for CORBA_SystemException. `d` and `factory` are those of the concrete class;
+    // the description is not copied and must outlive the exception.
     KELStdException(unsigned long minor, CORBA::CompletionStatus completed, CORBA_Exception::Description& d,
                     CORBA_Exception* (*factory)());
     KELStdException(unsigned long minor, CORBA::CompletionStatus completed, const char* reason,
@@ -87,6 +99,7 @@ public:
     // Minor code 0, COMPLETED_NO.
     KELStdException(CORBA_Exception::Description& d, CORBA_Exception* (*factory)());
 
+    // The description that was handed in.
     const Description* _desc() const override;
 
     // Deliberate: throws a KELStdException, though it describes itself as the concrete class. The

@@ -28,6 +28,7 @@ class KEL_API BaseUtil {
 public:
     // The version of the running system, as far as it could be read. Each field is 0 when it was not.
     struct SysVersion {
+        // Both stay 0 for a release that begins with a digit, as those of Linux do.
         int major;
         int minor;
     };
@@ -48,6 +49,7 @@ public:
     // same until the process ends; the caller must not free it.
     static const char* user_name();
 
+    // The number of this process.
     static int getpid();
 
     // The next piece of a text: begins with `s`, goes on when `s` is null, ends with null. The place

@@ -24,7 +24,11 @@
 
 class KEL_API KELPoll {
 public:
-    enum SupportedAPIs : int { API_SELECT = 1, API_POLL = 2 };
+    // The calls of the system that a poller may wait with.
+    enum SupportedAPIs : int {
+        API_SELECT = 1,  // select
+        API_POLL = 2     // poll
+    };
 
     // What to wait for, and what a wait reports: the bits of the system's poll.
     static const short evMaskRead = 0x0040;
@@ -45,6 +49,7 @@ public:
         void set(const timeval* tv);
         // Milliseconds; a negative value waits without limit.
         void set(int ms);
+        // Seconds and microseconds.
         void set(int sec, int usec);
     };
 
@@ -94,6 +99,7 @@ public:
     // Whether some entry holds `fd`.
     bool fdIsSet(int fd) const;
 
+    // The number of entries.
     int count() const { return _entries.count; }
     // The descriptor of the entry at `index`; -1 outside of 0 to count() - 1.
     int descriptor(int index) const { return has(index) ? _entries.items[index].fd : -1; }
@@ -104,28 +110,36 @@ protected:
     // An array that doubles when it is full.
     template <class T>
     struct List {
+        // How many items are in use, how many there is room for, and the owned array.
         std::int32_t count;
         std::int32_t capacity;
         T* items;
 
+        // Room for `slots` items, at least for one. Throws std::bad_alloc.
         explicit List(std::int32_t slots);
         List(const List&) = delete;
         List& operator=(const List&) = delete;
         ~List() { delete[] items; }
 
+        // A copy twice as large, which the caller owns, or null when the list is not full yet.
         T* grown() const;
+        // Takes what grown() gave over; null is ignored.
         void adopt(T* larger);
+        // Adds an item, for which there must be room.
         void append(const T& item) { items[count++] = item; }
     };
 
+    // Whether there is an entry at `index`.
     bool has(int index) const { return index >= 0 && index < _entries.count; }
 
+    // Descriptors with their events.
     List<pollfd> _entries;
     List<void*> _users;  // parallel to _entries: same index, same count
 };
 
 class KEL_API KELImplPoll : virtual public KELPoll {
 public:
+    // As for KELPoll.
     explicit KELImplPoll(int capacity);
     ~KELImplPoll() override;
 
@@ -143,6 +157,7 @@ private:
 
 class KEL_API KELImplSelect : virtual public KELPoll {
 public:
+    // As for KELPoll.
     explicit KELImplSelect(int capacity);
     ~KELImplSelect() override;
 

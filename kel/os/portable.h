@@ -24,6 +24,7 @@
 
 // The version of the operating system.
 struct KEL_API KELSysVersion {
+    // Both stay 0 for a release that begins with a digit, as those of Linux do.
     std::uint16_t major;
     std::uint16_t minor;
 };
@@ -60,6 +61,7 @@ public:
 
     // --- Process and system ----------------------------------------------------------------
 
+    // The number of this process.
     static int process_id();
 
     // How many descriptors the process may have.
@@ -87,6 +89,7 @@ public:
     // Compares without regard to case: negative, zero or positive.
     static int vstricmp(const char* a, const char* b);
 
+    // Whether there is a file, a folder or anything else under `path`.
     static bool vFileExists(const char* path);
 
     // Finds the program `name`: as it is, else in the folders of PATH, which ':', ';' or a blank
@@ -150,6 +153,7 @@ public:
 
     // --- Socket addresses ------------------------------------------------------------------
 
+    // Stores `port`, in host order; nothing in a foreign family.
     static void saSetPort(sockaddr* sa, int port);
 
     // The port, or -1 in a foreign family; of a descriptor, that of its local address.

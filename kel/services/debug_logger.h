@@ -92,12 +92,15 @@ public:
     // starts a new one. Does nothing unless trimming is on and the file is open.
     void trimLog();
 
+    // The enabled modules of each group.
     std::uint32_t _masks[5];
+    // The option bits.
     std::uint32_t _flags;
     std::uint32_t _trim_size;  // bytes
     std::int32_t _lines;       // headers since the last look at the size
     int _fd;                   // -1 when no file is open
     char* _file_name;          // owned, or null
+    // The open file, standard output, or null.
     std::FILE* _fp;
     unsigned char _pending;  // the named file still has to be opened
     unsigned char _in_line;  // a header is printed and its endl is still to come

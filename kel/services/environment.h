@@ -72,6 +72,7 @@ typedef CORBA_Environment Environment;
 // CORBA_Environment::current_environment().
 KEL_API CORBA_Environment* current_environment();
 
+// 1 when `e` is null, else 0.
 KEL_API unsigned char is_nil(CORBA_Environment* e);
 
 // Deletes an environment that the caller allocated, and its exception. Null is ignored.

@@ -65,7 +65,9 @@ public:
     // Writes prefix, `name` and suffix to `out`, which must have room for them: nothing is checked.
     static void _wrap_libname(char* out, const char* name);
 
+    // What instance() gives, null until it was called first.
     static KELLoadLibrary* _instance;
+    // Non-zero once there is an instance.
     static unsigned char _inited;
 
 private:
@@ -93,6 +95,7 @@ public:
     // 0 in every error that the loader throws.
     unsigned long code() const;
 
+    // The description of this class.
     const Description* _desc() const override;
     void _raise() const override;
 
@@ -107,6 +110,7 @@ public:
     // A LoadError() on the heap, released with CORBA::release.
     static CORBA_Exception* _factory();
 
+    // The description of this class.
     static Description _description;
 
 private:

@@ -67,6 +67,7 @@ public:
     // COMPLETED_MAYBE) when this stream already has a table.
     virtual void copy_in_tables(const KEListream& source);
 
+    // The offset: what has been read since the last reset(), as counted above.
     virtual unsigned long cur_in_offset() const;
 
     // A string that operator<<(const char*) wrote. A previous `s` is freed with CORBA::string_free,
@@ -135,6 +136,7 @@ public:
     KELOffsetTable** _tables;      // owned array; each table holds one reference for this stream
     std::int32_t _table_count;     // tables held, null entries included
     std::int32_t _table_capacity;  // length of _tables
+    // What cur_in_offset() gives here.
     std::uint32_t _offset;
     std::istream* _strm;  // not owned, may be null
 };

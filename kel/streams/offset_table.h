@@ -24,18 +24,22 @@
 // A stream offset as a dictionary key.
 class KELOffsetWrapper {
 public:
+    // The key for `offset`.
     KELOffsetWrapper(long offset) : _offset(offset) {}
 
+    // The offset.
     long offset() const { return _offset; }
 
 private:
     long _offset;
 };
 
+// The offset's low 32 bits.
 inline unsigned long _kel_hash(const KELOffsetWrapper& key) {
     return static_cast<std::uint32_t>(key.offset());
 }
 
+// 0 when the offsets are equal, else 1.
 inline int compare(const KELOffsetWrapper& a, const KELOffsetWrapper& b) {
     return a.offset() == b.offset() ? 0 : 1;
 }
@@ -43,19 +47,23 @@ inline int compare(const KELOffsetWrapper& a, const KELOffsetWrapper& b) {
 // The address of an object as a dictionary key. The object is neither owned nor looked at.
 class KELObjWrap {
 public:
+    // The key for `object`.
     KELObjWrap(void* object) : _object(object) {}
 
+    // The address.
     void* object() const { return _object; }
 
 private:
     void* _object;
 };
 
+// A number made of the address.
 inline unsigned long _kel_hash(const KELObjWrap& key) {
     const std::uint64_t address = reinterpret_cast<std::uintptr_t>(key.object());
     return static_cast<std::uint32_t>(address ^ (address >> 32));
 }
 
+// 0 when the addresses are equal, else 1.
 inline int compare(const KELObjWrap& a, const KELObjWrap& b) { return a.object() == b.object() ? 0 : 1; }
 
 class KEL_API KELOffsetTable : public virtual KELResource {

@@ -61,6 +61,7 @@ public:
     // COMPLETED_MAYBE) when this stream already has a table.
     virtual void copy_out_tables(const KELostream& source);
 
+    // The offset: what has been written since the last reset(), as counted above.
     virtual unsigned long cur_out_offset() const;
 
     // The length with its terminator (0 for null), then the quoted form of putCString, or one blank
@@ -118,6 +119,7 @@ public:
     KELOffsetTable** _tables;      // owned array; each table holds one reference for this stream
     std::int32_t _table_count;     // tables held, null entries included
     std::int32_t _table_capacity;  // length of _tables
+    // What cur_out_offset() gives here.
     std::uint32_t _offset;
     std::ostream* _strm;  // not owned, may be null
 };
