@@ -1,15 +1,19 @@
 // SPDX-License-Identifier: MIT
 #include <kel/core/internal/failure.h>
 #include <kel/services/debug_logger.h>
+#include <kel/streams/internal/digits.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cstdlib>
 #include <cstring>
 #include <ctime>
 #include <ios>
 #include <new>
 
 using kel::internal::assertion_failed;
+using kel::internal::longest_integer;
+using kel::internal::show_integer;
 
 namespace {
 
@@ -25,15 +29,80 @@ std::ios_base::Init standard_streams;
 
 // The index of the mask that `module` belongs to by its top four bits, or -1.
 int group_of(unsigned int module) {
-    static const signed char groups[16] = {0, 1, 2, -1, 3, -1, -1, -1, 4, -1, -1, -1, -1, -1, -1, -1};
-    return groups[module >> 28];
+    const unsigned int bits = module >> 28;
+    if ((bits & (bits - 1)) != 0) return -1;
+    return bits == 0 ? 0 : __builtin_ctz(bits) + 1;
 }
 
 // The same, but a module without a group ends the process, naming `function` and `line`.
 int checked_group(unsigned int module, unsigned line, const char* function) {
     const int group = group_of(module);
-    if (group == -1) assertion_failed("i != -1", "vdlogger", line, function);
+    if (__builtin_expect(group == -1, 0)) assertion_failed("i != -1", "vdlogger", line, function);
     return group;
+}
+
+// ---- the text of a time ----
+
+const std::size_t time_room = 26;  // for ctime_r
+const std::size_t longest_zone = 63;
+const char no_zone[] = "\n";  // stands for a TZ that is not set, which is another zone than an empty one
+
+// The last text and what it was made from. Looking a zone up can take as long as writing the entry, so
+// it is done once a second, and at once when TZ changes.
+struct TimeText {
+    std::time_t time;
+    char zone[longest_zone + 1];
+    char text[time_room];  // empty while there is none
+};
+TimeText last_time;
+bool last_time_taken;  // by a thread; others do without it, and so does a child whose parent's thread had it
+
+// The first 24 characters that ctime has for `now`, or none.
+void make_time_text(std::time_t now, char (&text)[time_room]) {
+    tzset();  // ctime_r, unlike ctime, need not look at a changed TZ
+    if (ctime_r(&now, text) == nullptr) text[0] = '\0';
+    text[24] = '\0';
+}
+
+void local_time_text(std::time_t now, char (&text)[time_room]) {
+    const char* zone = std::getenv("TZ");
+    if (zone == nullptr) zone = no_zone;
+    const std::size_t length = strnlen(zone, longest_zone + 1);
+    if (length > longest_zone || __atomic_test_and_set(&last_time_taken, __ATOMIC_ACQUIRE)) {
+        make_time_text(now, text);
+        return;
+    }
+    if (last_time.time != now || last_time.text[0] == '\0' || std::strcmp(last_time.zone, zone) != 0) {
+        make_time_text(now, last_time.text);
+        last_time.time = now;
+        std::memcpy(last_time.zone, zone, length + 1);
+    }
+    std::memcpy(text, last_time.text, time_room);
+    __atomic_clear(&last_time_taken, __ATOMIC_RELEASE);
+}
+
+// ---- the pieces of a header ----
+
+const std::size_t longest_short_name = 255;
+
+char* put_text(char* at, const char* text) {
+    while (*text != '\0') *at++ = *text++;
+    return at;
+}
+
+// At least `width` digits.
+char* put_hexadecimal(char* at, std::uint32_t n, int width) {
+    int digits = (35 - __builtin_clz(n | 1)) / 4;
+    if (digits < width) digits = width;
+    for (int i = digits; i-- > 0; n >>= 4) at[i] = "0123456789abcdef"[n & 15];
+    return at + digits;
+}
+
+// Apart from the question it belongs to, which is asked far more often than a line is traced and takes half
+// as long without the addresses of these texts.
+[[noreturn]] __attribute__((noinline, cold)) void no_group_to_look_at() {
+    assertion_failed("i != -1", "vdlogger", __LINE__,
+                     "unsigned char KELDebugLogger::isTraceEnabledFor(unsigned int) const");
 }
 
 // Masks, flags and the size limit are read without the lock.
@@ -162,13 +231,33 @@ bool KELDebugLogger::prints(unsigned int module, int group) const {
     return (read_word(_masks[group]) & module) != 0 || (read_word(_masks[0]) & trace_all_bit) != 0;
 }
 
+// A name of the common length makes a header that is put together here. Printing it by its format takes
+// longer than the system takes to write it.
 void KELDebugLogger::print_header(unsigned int level, unsigned int module, const char* file, int line) {
     const std::time_t now = std::time(nullptr);
-    char text[26];
-    tzset();  // ctime_r, unlike ctime, need not look at a changed TZ
-    if (ctime_r(&now, text) == nullptr) text[0] = '\0';
-    text[24] = '\0';
-    std::fprintf(_fp, "=> %s,%02x,%08x,%s,%d,%d\n", text, level, module, file, line, static_cast<int>(now));
+    char text[time_room];
+    local_time_text(now, text);
+    if (file == nullptr || std::strlen(file) > longest_short_name) {
+        std::fprintf(_fp, "=> %s,%02x,%08x,%s,%d,%d\n", text, level, module, file, line,
+                     static_cast<int>(now));
+        return;
+    }
+    char header[longest_short_name + 100];
+    char* at = put_text(header, "=> ");
+    at = put_text(at, text);
+    *at++ = ',';
+    at = put_hexadecimal(at, level, 2);
+    *at++ = ',';
+    at = put_hexadecimal(at, module, 8);
+    *at++ = ',';
+    at = put_text(at, file);
+    *at++ = ',';
+    at = show_integer(at, line);
+    *at++ = ',';
+    at = show_integer(at, static_cast<int>(now));
+    at = put_text(at, "\n");
+    *at = '\0';
+    std::fputs(header, _fp);
 }
 
 // Inside a line _fp is null only after a closeFile() in its middle; the rest of that line is lost.
@@ -178,7 +267,11 @@ KELDebugLogger& KELDebugLogger::operator<<(const char* s) {
 }
 
 KELDebugLogger& KELDebugLogger::operator<<(long n) {
-    if (_in_line != 0 && _fp != nullptr) std::fprintf(_fp, "%ld", n);
+    if (_in_line != 0 && _fp != nullptr) {
+        char text[longest_integer + 1];
+        *show_integer(text, n) = '\0';
+        std::fputs(text, _fp);
+    }
     return *this;
 }
 
@@ -216,8 +309,8 @@ void KELDebugLogger::untraceModule(unsigned int module) {
 // Deliberate: the group bits are part of both words, so one enabled module of groups 1 to 4 makes every
 // module of its group look enabled. Pinned by DebugLogger.TheGroupBitAloneMakesAModuleEnabled.
 unsigned char KELDebugLogger::isTraceEnabledFor(unsigned int module) const {
-    const int group = checked_group(module, __LINE__,
-                                    "unsigned char KELDebugLogger::isTraceEnabledFor(unsigned int) const");
+    const int group = group_of(module);
+    if (group == -1) no_group_to_look_at();
     return (read_word(_masks[group]) & module) != 0;
 }
 

@@ -2,7 +2,8 @@
 #include <kel/streams/internal/text.h>
 #include <kel/streams/istream.h>
 
-using kel::internal::read_value;
+using kel::internal::extract_value;
+using kel::internal::scan_values;
 using kel::internal::text;
 
 namespace {
@@ -11,7 +12,11 @@ namespace {
 // not asked again for each of the values that are missing.
 template <class T>
 void extract_all(std::istream& stream, T* values, unsigned int n) {
-    for (unsigned int i = 0; i < n && !stream.fail(); ++i) read_value(stream, values[i]);
+    for (unsigned int i = 0; i < n && !stream.fail();) {
+        const unsigned int scanned = scan_values(stream, values + i, n - i);
+        i += scanned;
+        if (scanned == 0) extract_value(stream, values[i++]);
+    }
     stream.get();
 }
 

@@ -2,6 +2,8 @@
 #include <kel/containers/strings.h>
 #include <kel/streams/internal/console.h>
 #include <kel/streams/internal/escapes.h>
+#include <kel/streams/internal/plain.h>
+#include <kel/streams/internal/quoted_block.h>
 #include <kel/streams/internal/text.h>
 #include <kel/streams/istream.h>
 
@@ -11,10 +13,18 @@
 #include <new>
 #include <string>
 
+using kel::internal::AfterBlock;
 using kel::internal::error_stream;
 using kel::internal::Escape;
 using kel::internal::escapes;
 using kel::internal::is_cin;
+using kel::internal::is_over_string;
+using kel::internal::is_plain;
+using kel::internal::QuotedTarget;
+using kel::internal::read_block;
+using kel::internal::read_run;
+using kel::internal::read_value;
+using kel::internal::smallest_block;
 using kel::internal::text;
 
 namespace {
@@ -42,7 +52,9 @@ wchar_t* new_wide_array(std::uint32_t n) {
 
 // Consumes white space and one character, which must be the opening quote. Otherwise reports.
 bool read_opening_quote(std::istream& in) {
-    in >> std::ws;
+    // There is no white space to skip where the writer has been, and nobody sees a look at a string buffer.
+    const bool quoted = is_plain(in) && is_over_string(in) && in.rdbuf()->sgetc() == '"';
+    if (!quoted) in >> std::ws;
     const int c = in.get();
     if (in.eof()) {
         error_stream() << "KEListream::getCString: Unexpected EOF\n" << std::flush;
@@ -138,7 +150,7 @@ KEListream& KEListream::operator>>(char*& s) {
     }
 
     std::uint32_t length = 0;
-    in >> length;
+    read_value(in, length);
     _offset += 4;
     CORBA::string_free(s);
     s = nullptr;
@@ -175,7 +187,24 @@ KEListream& KEListream::getCString(char* buf, unsigned int len) {
     _offset += 1;
     if (!quoted) return *this;
 
+    const bool by_runs = is_plain(in) && is_over_string(in);
+    bool by_blocks = by_runs;
     for (;;) {
+        if (by_runs && len > 0 && in.good()) {
+            QuotedTarget target = {buf, len, _offset};
+            AfterBlock after = AfterBlock::odd;
+            if (by_blocks && len >= smallest_block) {
+                after = read_block(in, target);
+                by_blocks = after == AfterBlock::open;
+            } else {
+                read_run(in, target);
+            }
+            buf = target.buf;
+            len = target.room;
+            _offset = target.offset;
+            if (after == AfterBlock::closed) break;
+            if (after == AfterBlock::open) continue;
+        }
         if (len == 0 && takes_room(in.peek())) {  // and stays unread
             _offset += 1;
             report_overflow();
@@ -184,10 +213,7 @@ KEListream& KEListream::getCString(char* buf, unsigned int len) {
         const int c = in.get();
         if (c == '"') {
             if (len == 0) return *this;
-            *buf = '\0';
-            in.get();
-            _offset += 1;
-            return *this;
+            break;
         }
         if (c == end_of_input) {
             // Every further read would give the same, up to the overflow.
@@ -201,11 +227,15 @@ KEListream& KEListream::getCString(char* buf, unsigned int len) {
         --len;
         *buf++ = c == '\\' ? read_escape(in, _offset) : static_cast<char>(c);
     }
+    *buf = '\0';
+    in.get();
+    _offset += 1;
+    return *this;
 }
 
 KEListream& KEListream::operator>>(wchar_t*& ws) {
     std::uint32_t n = 0;
-    text(_strm) >> n;
+    read_value(text(_strm), n);
     if (ws == nullptr) ws = new_wide_array(n);
     get(ws, n);
     _offset += 4 * n;

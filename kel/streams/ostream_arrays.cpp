@@ -2,6 +2,7 @@
 #include <kel/streams/internal/text.h>
 #include <kel/streams/ostream.h>
 
+using kel::internal::show_values;
 using kel::internal::text;
 using kel::internal::write_value;
 
@@ -9,7 +10,11 @@ namespace {
 
 template <class T>
 void insert_all(std::ostream& stream, const T* values, unsigned int n) {
-    for (unsigned int i = 0; i < n; ++i) write_value(stream, values[i]);
+    for (unsigned int i = 0; i < n;) {
+        const unsigned int written = show_values(stream, values + i, n - i);
+        i += written;
+        if (written == 0) write_value(stream, values[i++]);
+    }
 }
 
 // Writes `n` values, each with its separator. `share` is what one of them counts.

@@ -24,6 +24,13 @@ protected:
         log << endl;
         return text_of(path);
     }
+
+    // The same without what was printed before.
+    template <class... Args>
+    std::string next_header_at(Args... args) {
+        const std::size_t before = text_of(path).size();
+        return header_at(args...).substr(before);
+    }
 };
 
 // --- the header --------------------------------------------------------------------------------------
@@ -60,6 +67,50 @@ TEST_F(DebugLogLine, TheHeaderGivesLocalTimeAndFollowsTheZone) {
     set_time_zone("UTC0");
     ::setenv("TZ", "EST5", 1);  // not told to the C library: that is the logger's task
     EXPECT_EQ(header_at(some_time), "=> Sat Sep  8 20:46:40 2001,03,10000001,server.cpp,42,1000000000\n\n");
+}
+
+TEST_F(DebugLogLine, AZoneThatChangesWithinASecondShowsAtOnce) {
+    const char* const zones[] = {"UTC0", "EST5", "UTC0", "UTC-1", ""};
+    const char* const hours[] = {"01", "20", "01", "02", "01"};
+    for (std::size_t i = 0; i < 5; ++i) {
+        ::setenv("TZ", zones[i], 1);
+        for (int again = 0; again < 2; ++again) {
+            EXPECT_EQ(next_header_at(some_time).substr(14, 2), hours[i]) << zones[i];
+        }
+    }
+    const std::string long_zone = std::string(80, 'Z') + "2";
+    ::setenv("TZ", long_zone.c_str(), 1);
+    EXPECT_EQ(next_header_at(some_time).substr(14, 2), "23");
+    ::unsetenv("TZ");
+    const std::string unset = next_header_at(some_time);
+    ::setenv("TZ", "UTC-1", 1);
+    EXPECT_EQ(next_header_at(some_time).substr(14, 2), "02");
+    ::unsetenv("TZ");
+    EXPECT_EQ(next_header_at(some_time), unset);
+}
+
+TEST_F(DebugLogLine, EachSecondShowsItsOwnTime) {
+    for (int second : {0, 1, 1, 59, 0}) {
+        const std::string header = next_header_at(second);
+        EXPECT_EQ(header.substr(20, 2), std::string(second < 10 ? "0" : "") + std::to_string(second));
+    }
+}
+
+TEST_F(DebugLogLine, FileNamesOfAnyLengthAndNonePrintAsTheirFormatDoes) {
+    for (std::size_t length : {0, 1, 254, 255, 256, 5000}) {
+        const std::string name(length, 'n');
+        EXPECT_EQ(next_header_at(0, 3, module, name.c_str(), 42),
+                  "=> Thu Jan  1 00:00:00 1970,03,10000001," + name + ",42,0\n\n");
+    }
+    EXPECT_EQ(next_header_at(0, 3, module, nullptr, 42),
+              "=> Thu Jan  1 00:00:00 1970,03,10000001,(null),42,0\n\n");
+}
+
+TEST_F(DebugLogLine, ExtremeNumbersPrintAsTheirFormatDoes) {
+    EXPECT_EQ(next_header_at(0, 0, 0x2, "f", INT_MIN),
+              "=> Thu Jan  1 00:00:00 1970,00,00000002,f,-2147483648,0\n\n");
+    EXPECT_EQ(next_header_at(0, 0xffffffff, module, "f", INT_MAX),
+              "=> Thu Jan  1 00:00:00 1970,ffffffff,10000001,f,2147483647,0\n\n");
 }
 
 TEST_F(DebugLogLine, BothTimesOfAHeaderComeFromOneReading) {

@@ -5,6 +5,7 @@
 #ifndef KEL_STREAMS_INTERNAL_TEXT_H
 #define KEL_STREAMS_INTERNAL_TEXT_H
 
+#include <cstddef>
 #include <istream>
 #include <ostream>
 
@@ -36,26 +37,48 @@ inline int shown(unsigned char value) { return value; }
 inline int shown(wchar_t value) { return static_cast<int>(value); }
 inline double shown(float value) { return value; }
 
+// Writes as many of `n` values as have a short way on this stream and fit into one block, and returns
+// how many. The next one, if there is one to write, is left to the standard inserter.
 template <class T>
-void write_value(std::ostream& out, T value) {
-    out << shown(value) << " ";
-}
+unsigned int show_values(std::ostream& out, const T* values, unsigned int n);
 
 template <class T>
-void read_value(std::istream& in, T& value) {
+void write_value(std::ostream& out, T value) {
+    if (show_values(out, &value, 1) == 0) out << shown(value) << " ";
+}
+
+// Writes `n` characters and `last` to a plain stream over a string, as insertions would of which the last
+// one writes `last`: when one fails, those behind it are refused, and that sets failbit too.
+void write_to_string(std::ostream& out, const char* text, std::ptrdiff_t n, char last);
+
+// Writes a number without a separator.
+void write_bare(std::ostream& out, unsigned long value);
+
+// Reads as many of `n` values as have a short way on this stream, and returns how many. The next one, if
+// there is one to read, is left to the standard extractor, which finds what it would have found.
+template <class T>
+unsigned int scan_values(std::istream& in, T* values, unsigned int n);
+
+template <class T>
+void extract_value(std::istream& in, T& value) {
     in >> value;
 }
 
 // Reads a number into a type that the standard extractor would take for a character. It starts as
 // the old value, because the extractor leaves its target alone on a stream that has already failed.
 template <class T>
-void read_number(std::istream& in, T& value) {
+void extract_number(std::istream& in, T& value) {
     int number = static_cast<int>(value);
     in >> number;
     value = static_cast<T>(number);
 }
-inline void read_value(std::istream& in, unsigned char& value) { read_number(in, value); }
-inline void read_value(std::istream& in, wchar_t& value) { read_number(in, value); }
+inline void extract_value(std::istream& in, unsigned char& value) { extract_number(in, value); }
+inline void extract_value(std::istream& in, wchar_t& value) { extract_number(in, value); }
+
+template <class T>
+void read_value(std::istream& in, T& value) {
+    if (scan_values(in, &value, 1) == 0) extract_value(in, value);
+}
 
 }  // namespace internal
 }  // namespace kel

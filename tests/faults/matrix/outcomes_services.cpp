@@ -56,9 +56,10 @@ std::vector<Row> line_rows() {
         {"LogThatIsClosedBetween", "fopen64", {}, nth(2), one_line},
         {"LogThatIsClosedBetween", "fopen64", {}, for_ever, no_line},
         {"LogOnStandardOutput", "time", {}, any, ignored().shows(line_without_time)},
+        {"LogOnStandardOutput", "getenv", {}, any, ignored().shows(line)},
         {"LogOnStandardOutput", "pthread_mutex_unlock", {}, nth(2), ends_in_unlock.shows(line)},
         // A line that cannot be flushed goes out with the next one, or when the file is closed.
-        {"LogL* LogThatIsClosedBetween LogOnStandardOutput LogR*", "time", {}, any, ignored()},
+        {"LogL* LogThatIsClosedBetween LogOnStandardOutput LogR*", "time getenv", {}, any, ignored()},
         {"LogL* LogThatIsClosedBetween LogOnStandardOutput", "fflush", {}, any, ignored()},
     };
 }
@@ -105,6 +106,7 @@ std::vector<PairRow> service_pair_rows() {
          gives("0 lines, backup of -1 bytes")},
         // Without a rotation the next flush and the next close are those of the line and of the end.
         {"LogRotates", "fstat64 fflush", {}, "fflush fclose", {}, Taken::as_the_first},
+        {"LogOnStandardOutput", "time", {}, "getenv", {}, Taken::as_the_first},
         {"LogOnStandardOutput",
          "time",
          {},

@@ -1,0 +1,119 @@
+// The decimal digits of integers, without a locale.
+//
+//     char room[longest_integer];
+//     char* const end = show_integer(room, -4711);
+//
+// Digits are made four at a time in one word, by multiplications that do not wait for each other.
+//
+// SPDX-License-Identifier: MIT
+#ifndef KEL_STREAMS_INTERNAL_DIGITS_H
+#define KEL_STREAMS_INTERNAL_DIGITS_H
+
+#include <cstdint>
+#include <type_traits>
+
+namespace kel {
+namespace internal {
+
+constexpr int longest_integer = 24;  // the longest text has 20 characters; what follows them is overwritten
+
+// For copies whose length the compiler knows. The library's calls of memcpy are checked at run time
+// wherever the compiler cannot tell that the room is enough, which takes longer than these copies.
+template <int n>
+void copy_bytes(char* to, const void* from) {
+    __builtin_memcpy(to, from, n);
+}
+
+// The digits of a number below 10,000 as the bytes of a word, the first one lowest. Two numbers below 100
+// lie in the halves of a word; 103 / 1024 is close enough to a tenth for them.
+inline std::uint32_t four_digits(std::uint32_t n) {
+    const std::uint32_t hundreds = n * 5243 >> 19;
+    const std::uint32_t halves = hundreds | (n - hundreds * 100) << 16;
+    const std::uint32_t tens = halves * 103 >> 10 & 0x000f000f;
+    return tens + ((halves - tens * 10) << 8);
+}
+
+constexpr std::uint32_t four_zeros = 0x30303030;
+
+// Numbers below 10,000 and 100,000,000 with leading zeros.
+inline void put_four(char* at, std::uint32_t n) {
+    const std::uint32_t characters = four_digits(n) + four_zeros;
+    copy_bytes<4>(at, &characters);
+}
+
+inline void put_eight(char* at, std::uint32_t n) {
+    put_four(at, n / 10000);
+    put_four(at + 4, n % 10000);
+}
+
+// A number below 10,000 without leading zeros, which are the lowest bytes. Gives the end of its digits,
+// and may write behind it.
+inline char* put_up_to_four(char* at, std::uint32_t n) {
+    const std::uint32_t digits = four_digits(n);
+    const int zeros = __builtin_ctz(digits | 1 << 24) / 8;
+    const std::uint32_t characters = (digits + four_zeros) >> 8 * zeros;
+    copy_bytes<4>(at, &characters);
+    return at + 4 - zeros;
+}
+
+// The upper half of a product, from the four products of halves: nothing wider is needed at 32 bits.
+inline std::uint64_t high_product(std::uint64_t a, std::uint64_t b) {
+    const std::uint64_t a1 = a >> 32, a0 = static_cast<std::uint32_t>(a);
+    const std::uint64_t b1 = b >> 32, b0 = static_cast<std::uint32_t>(b);
+    const std::uint64_t cross = a1 * b0 + (a0 * b0 >> 32);
+    const std::uint64_t other = a0 * b1 + static_cast<std::uint32_t>(cross);
+    return a1 * b1 + (cross >> 32) + (other >> 32);
+}
+
+// n / 100,000,000 for any n: by the reciprocal 2^90 / 10^8, rounded up, because a 32-bit processor takes
+// longer for one division of 64 bits than for all digits.
+inline std::uint64_t without_eight_digits(std::uint64_t n) {
+    return high_product(n, 0xabcc77118461cefdu) >> 26;
+}
+
+// Each of these gives the end of the text.
+inline char* show_integer(char* at, std::uint32_t n) {
+    if (n < 10000) return put_up_to_four(at, n);
+    if (n < 100000000) {
+        at = put_up_to_four(at, n / 10000);
+        put_four(at, n % 10000);
+        return at + 4;
+    }
+    at = put_up_to_four(at, n / 100000000);
+    put_eight(at, n % 100000000);
+    return at + 8;
+}
+
+inline char* show_integer(char* at, std::uint64_t n) {
+    if (n <= 0xffffffffu) return show_integer(at, static_cast<std::uint32_t>(n));
+    const std::uint64_t upper = without_eight_digits(n);
+    std::uint32_t uppermost = static_cast<std::uint32_t>(upper);
+    if (upper > 0xffffffffu) {
+        uppermost = static_cast<std::uint32_t>(without_eight_digits(upper));
+        at = show_integer(at, uppermost);
+        put_eight(at, static_cast<std::uint32_t>(upper - uppermost * std::uint64_t(100000000)));
+        at += 8;
+    } else {
+        at = show_integer(at, uppermost);
+    }
+    put_eight(at, static_cast<std::uint32_t>(n - upper * 100000000));
+    return at + 8;
+}
+
+// Every other integer as the smallest of the two above that holds it.
+template <class T>
+char* show_integer(char* at, T value) {
+    typedef std::conditional_t<sizeof(T) <= 4, std::uint32_t, std::uint64_t> Unsigned;
+    Unsigned size = static_cast<Unsigned>(value);
+    if constexpr (std::is_signed_v<T>) {
+        *at = '-';
+        at += value < 0;
+        size = value < 0 ? 0 - size : size;
+    }
+    return show_integer(at, size);
+}
+
+}  // namespace internal
+}  // namespace kel
+
+#endif

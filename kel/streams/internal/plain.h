@@ -1,0 +1,53 @@
+// Whether a standard stream is a plain one, on which numbers and quoted strings may be shown and read
+// without its facets: nobody can tell, for the text, the states and what reaches the buffer are the same.
+//
+//   is_plain          good, with the flags, width and locale that streams are born with, and no observer
+//   is_over_string    reads or writes a std::stringbuf and nothing derived from it
+//
+// Only a std::stringbuf is known well enough to be given several pieces as one: no derived class sees the
+// calls, nothing but lack of memory stops it, and then it holds every character there was room for.
+//
+// SPDX-License-Identifier: MIT
+#ifndef KEL_STREAMS_INTERNAL_PLAIN_H
+#define KEL_STREAMS_INTERNAL_PLAIN_H
+
+#include <cstring>
+#include <ios>
+#include <locale>
+#include <sstream>
+#include <typeinfo>
+
+// Room that is written before it is read. Cleared first, as the library's build clears everything, it
+// would cost more than the short way spares.
+#define KEL_UNINITIALIZED __attribute__((uninitialized))
+
+namespace kel {
+namespace internal {
+
+// Compares what the two objects hold instead of calling operator==, which takes as long as a number's
+// digits do. Equal bytes are the same locale; other ways of being equal only miss the short way. The
+// standard library's _M_getloc spares the copy that getloc() counts.
+inline bool has_classic_locale(const std::ios_base& stream) {
+    static const std::locale& classic = std::locale::classic();
+    return std::memcmp(&stream._M_getloc(), &classic, sizeof(std::locale)) == 0;
+}
+
+// Has no tied stream to flush, no flush of its own after each piece (a flag), and throws nothing.
+inline bool is_plain(const std::ios& stream) {
+    const std::ios_base::fmtflags flags = std::ios_base::skipws | std::ios_base::dec;
+    return (stream.rdstate() | stream.exceptions()) == std::ios_base::goodbit && stream.flags() == flags &&
+           stream.width() == 0 && stream.tie() == nullptr && has_classic_locale(stream);
+}
+
+// Doubles are shown with as many digits as streams are born with.
+inline bool has_plain_precision(const std::ios_base& stream) { return stream.precision() == 6; }
+
+inline bool is_over_string(const std::ios& stream) {
+    const std::streambuf* const buffer = stream.rdbuf();
+    return buffer != nullptr && &typeid(*buffer) == &typeid(std::stringbuf);
+}
+
+}  // namespace internal
+}  // namespace kel
+
+#endif
