@@ -37,14 +37,16 @@ function(kel_common_options target)
 endfunction()
 
 # Options of the library alone. Fortification is left to builds without sanitizers, which check
-# the same calls themselves. LTO stays off: it reverses the order of the initialisers.
+# the same calls themselves. LTO stays off: it reverses the order of the initialisers. So do units that
+# are merged, which a project around this one may ask for as well.
 function(kel_library_options target)
   kel_common_options(${target})
+  target_include_directories(${target} PRIVATE ${PROJECT_SOURCE_DIR} ${PROJECT_BINARY_DIR}/include)
   set_target_properties(${target} PROPERTIES
       CXX_VISIBILITY_PRESET hidden VISIBILITY_INLINES_HIDDEN ON POSITION_INDEPENDENT_CODE ON
-      INTERPROCEDURAL_OPTIMIZATION OFF)
+      INTERPROCEDURAL_OPTIMIZATION OFF UNITY_BUILD OFF)
   target_compile_definitions(${target} PRIVATE _FILE_OFFSET_BITS=64)
-  target_compile_options(${target} PRIVATE -fno-strict-overflow -fno-delete-null-pointer-checks
+  target_compile_options(${target} PRIVATE -fno-lto -fno-strict-overflow -fno-delete-null-pointer-checks
       -Wformat -Werror=format-security)
   if(NOT KEL_SANITIZE)
     target_compile_definitions(${target} PRIVATE _GLIBCXX_ASSERTIONS)
@@ -61,4 +63,13 @@ function(kel_library_options target)
   foreach(flag relro now noexecstack nodelete separate-code)
     target_link_options(${target} PRIVATE -Wl,-z,${flag})
   endforeach()
+endfunction()
+
+# What a program that uses the library has to know, in this tree and where it is installed.
+function(kel_library_interface target)
+  target_compile_features(${target} INTERFACE cxx_std_11)
+  target_include_directories(${target} INTERFACE
+      $<BUILD_INTERFACE:${PROJECT_SOURCE_DIR}>
+      $<BUILD_INTERFACE:${PROJECT_BINARY_DIR}/include>
+      $<INSTALL_INTERFACE:${CMAKE_INSTALL_INCLUDEDIR}>)
 endfunction()

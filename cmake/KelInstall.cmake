@@ -1,5 +1,6 @@
-# `cmake --install`: the headers but the private ones, the library, the CMake package
-# (find_package(kel) gives kel::kel) and kel.pc, where GNUInstallDirs says.
+# `cmake --install`: the headers but the private ones, the libraries, the CMake package (find_package(kel)
+# gives kel::kel and kel::kel_static) and kel.pc, where GNUInstallDirs says. The build folder is a CMake
+# package too: -Dkel_DIR names it.
 #
 # The version file refuses a program of the other word size, so that both libraries may be
 # installed side by side and each program finds its own.
@@ -7,15 +8,19 @@ include(CMakePackageConfigHelpers)
 
 set(KEL_PACKAGE_DIR ${CMAKE_INSTALL_LIBDIR}/cmake/kel)
 
-target_compile_features(kel INTERFACE cxx_std_11)
-
-install(TARGETS kel EXPORT kel LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR})
+set(libraries kel)
+if(KEL_BUILD_STATIC)
+  list(APPEND libraries kel_static)
+endif()
+install(TARGETS ${libraries} EXPORT kel
+    LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR} ARCHIVE DESTINATION ${CMAKE_INSTALL_LIBDIR})
 install(DIRECTORY kel DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}
     FILES_MATCHING PATTERN *.h PATTERN *.inc PATTERN internal EXCLUDE)
 install(FILES ${PROJECT_BINARY_DIR}/include/kel/version.h DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/kel)
 install(FILES LICENSE DESTINATION ${CMAKE_INSTALL_DOCDIR})
 
 install(EXPORT kel NAMESPACE kel:: FILE kel-config.cmake DESTINATION ${KEL_PACKAGE_DIR})
+export(EXPORT kel NAMESPACE kel:: FILE ${PROJECT_BINARY_DIR}/kel-config.cmake)
 write_basic_package_version_file(${PROJECT_BINARY_DIR}/kel-config-version.cmake
     COMPATIBILITY SameMajorVersion)
 install(FILES ${PROJECT_BINARY_DIR}/kel-config-version.cmake DESTINATION ${KEL_PACKAGE_DIR})

@@ -29,6 +29,7 @@
 #include <kel/core/thread_local.h>
 #include <kel/core/unique_id.h>
 #include <kel/exceptions/exception.h>
+#include <kel/exceptions/explain.h>
 #include <kel/exceptions/raise.h>
 #include <kel/exceptions/standard.h>
 #include <kel/exceptions/system_exception.h>

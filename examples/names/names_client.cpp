@@ -2,6 +2,7 @@
 // comes of each.
 //
 // SPDX-License-Identifier: MIT
+#include <kel/exceptions/explain.h>
 #include <kel/exceptions/standard.h>
 #include <kel/os/portable.h>
 
@@ -163,7 +164,8 @@ int main(int argc, char** argv) {
     } catch (const names::UsageError& mistake) {
         std::cerr << "names_client: " << mistake.what() << '\n' << kUsage;
     } catch (const CORBA_Exception& failure) {
-        std::cerr << "names_client: cannot go on\n" << failure;
+        const CORBA_String_var why(kel_explain(failure));
+        std::cerr << "names_client: cannot go on\n" << failure << why.in() << '\n';
     } catch (const std::exception& failure) {
         std::cerr << "names_client: " << failure.what() << '\n';
     }

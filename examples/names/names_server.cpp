@@ -1,6 +1,7 @@
 // names_server: keeps names bound to values and serves them to any number of clients.
 //
 // SPDX-License-Identifier: MIT
+#include <kel/exceptions/explain.h>
 #include <kel/exceptions/standard.h>
 #include <kel/os/portable.h>
 #include <sys/resource.h>
@@ -121,7 +122,8 @@ int main(int argc, char** argv) {
     } catch (const names::UsageError& mistake) {
         std::cerr << "names_server: " << mistake.what() << '\n' << kUsage;
     } catch (const CORBA_Exception& failure) {
-        std::cerr << "names_server: cannot serve\n" << failure;
+        const CORBA_String_var why(kel_explain(failure));
+        std::cerr << "names_server: cannot serve\n" << failure << why.in() << '\n';
     } catch (const std::exception& failure) {
         std::cerr << "names_server: " << failure.what() << '\n';
     }

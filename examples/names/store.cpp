@@ -11,9 +11,9 @@ namespace names {
 
 namespace {
 
-// What an entry owned goes with it.
+// What an entry owned goes with it. The dictionary hands out copies.
 template <class Owned>
-void delete_value(CORBA_String_var, Owned* value) {
+void delete_value(CORBA_String_var, Owned* value) {  // NOLINT(performance-unnecessary-value-param)
     delete value;
 }
 

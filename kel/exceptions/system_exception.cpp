@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include <kel/exceptions/internal/downcast.h>
+#include <kel/exceptions/internal/status.h>
 #include <kel/exceptions/system_exception.h>
 #include <kel/streams/istream.h>
 #include <kel/streams/ostream.h>
@@ -10,7 +11,15 @@ namespace {
 
 const unsigned long largest_bare_minor = 0xfff;
 
-const char* status_text(CORBA::CompletionStatus status) {
+// A number too wide for a status stays none of the three: cut to its low bits it could become one.
+CORBA::CompletionStatus status_of(unsigned long number) {
+    const unsigned long widest = 0xffffffff;
+    return static_cast<CORBA::CompletionStatus>(number < widest ? number : widest);
+}
+
+}  // namespace
+
+const char* kel::internal::status_text(CORBA::CompletionStatus status) {
     switch (status) {
         case CORBA::COMPLETED_YES:
             return "YES";
@@ -21,14 +30,6 @@ const char* status_text(CORBA::CompletionStatus status) {
     }
     return "Invalid status";
 }
-
-// A number too wide for a status stays none of the three: cut to its low bits it could become one.
-CORBA::CompletionStatus status_of(unsigned long number) {
-    const unsigned long widest = 0xffffffff;
-    return static_cast<CORBA::CompletionStatus>(number < widest ? number : widest);
-}
-
-}  // namespace
 
 // ---- CORBA_SystemException ----
 
@@ -75,7 +76,7 @@ void CORBA_SystemException::_pretty_print(KELostream& out) const {
     }
     out << "\tMinor: " << _minor;
     endl(out);
-    out << "\tCompletion Status: " << status_text(_completed);
+    out << "\tCompletion Status: " << kel::internal::status_text(_completed);
     endl(out);
 }
 

@@ -50,6 +50,11 @@ exports_are_the_listed_ones() {
     wc -l <"$1"
 }
 
+# The packages tell since which version a symbol has been there, for each symbol of $1.
+package_symbols_are_the_listed_ones() {
+    sed -n 's/^ \([^ (]*\)@Base .*/\1/p' "$2" | diff "$1" -
+}
+
 public_headers() { find "$top/kel" \( -name '*.h' -o -name '*.inc' \) ! -path '*/internal/*' | sort; }
 
 # A type that no public header defines is the library's own business.

@@ -13,7 +13,7 @@ while [ "$1" != -- ]; do
 done
 shift
 
-warnings=(-Wall -Wextra -Wpedantic -Wshadow -Werror)
+warnings=(-Wall -Wextra -Wpedantic -Wshadow -Wold-style-cast -Werror)
 if [ "${compile[0]}" = clang++ ]; then
     warnings+=(-Wthread-safety)
 fi

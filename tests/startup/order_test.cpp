@@ -1,25 +1,25 @@
 // The order in which the library's units come to life, and go.
 // SPDX-License-Identifier: MIT
 #include <dlfcn.h>
-#include <elf.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <link.h>
 
 #include <algorithm>
 #include <cstring>
-#include <fstream>
-#include <iterator>
 #include <sstream>
 #include <string>
 #include <vector>
 
 #include "tests/startup/start.h"
+#include "tests/startup/symbols.h"
 
 namespace {
 
+using kel::test::Function;
 using kel::test::Outcome;
 using kel::test::start;
+using kel::test::Symbols;
 using testing::Contains;
 using testing::ElementsAreArray;
 using testing::Not;
@@ -55,70 +55,15 @@ std::vector<ElfW(Addr)> initialisers() {
     return offsets;
 }
 
-struct Function {
-    std::string unit;  // the source file's name without its folder
-    std::string name;
-};
-
-// The symbol table of the library's file. Local symbols follow the name of their source file.
-class Symbols {
-public:
-    explicit Symbols(const char* path) {
-        std::ifstream file(path, std::ios::binary);
-        _bytes.assign(std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>());
-    }
-
-    Function function_at(ElfW(Addr) offset) const {
-        const auto& header = at<ElfW(Ehdr)>(0);
-        for (int i = 0; i < header.e_shnum; ++i) {
-            const auto& section = at<ElfW(Shdr)>(header.e_shoff + i * sizeof(ElfW(Shdr)));
-            if (section.sh_type != SHT_SYMTAB) continue;
-            return find(section, at<ElfW(Shdr)>(header.e_shoff + section.sh_link * sizeof(ElfW(Shdr))),
-                        offset);
-        }
-        return {"no symbol table", ""};
-    }
-
-private:
-    template <class T>
-    const T& at(std::size_t offset) const {
-        return *reinterpret_cast<const T*>(_bytes.data() + offset);
-    }
-
-    Function find(const ElfW(Shdr) & symbols, const ElfW(Shdr) & strings, ElfW(Addr) offset) const {
-        std::string unit;
-        for (std::size_t n = 0; n < symbols.sh_size / sizeof(ElfW(Sym)); ++n) {
-            const auto& symbol = at<ElfW(Sym)>(symbols.sh_offset + n * sizeof(ElfW(Sym)));
-            const std::string name(_bytes.data() + strings.sh_offset + symbol.st_name);
-            const int type = symbol.st_info & 0xf;
-            if (type == STT_FILE) unit = name.substr(name.rfind('/') + 1);
-            if (type == STT_FUNC && symbol.st_value == offset) return {unit, name};
-        }
-        return {"unknown", ""};
-    }
-
-    std::string _bytes;
-};
-
-// The compiler's own entries: the C runtime's, those of sanitizers and of coverage counters.
-bool is_the_compilers(const Function& f) {
-    return f.name == "frame_dummy" || f.name.find("module_ctor") != std::string::npos ||
-           f.name.rfind("_sub_I_", 0) == 0 || f.name.rfind("__llvm_", 0) == 0;
-}
-
 TEST(StartUpOrder, InitialisersFollowTheListOfUnits) {
     ASSERT_NE(dlopen(KEL_STARTUP_LIBRARY, RTLD_NOW), nullptr);
     const Symbols symbols(KEL_STARTUP_LIBRARY);
     Names units;
     for (const ElfW(Addr) offset : initialisers()) {
         const Function f = symbols.function_at(offset);
-        if (!is_the_compilers(f)) units.push_back(f.unit);
+        if (!kel::test::is_the_compilers(f)) units.push_back(f.unit);
     }
-    const char* const expected[] = {
-        "vdlogger.cpp",     "resource.cpp", "arg_list.cpp", "unique_id.cpp", "environment.cpp",
-        "offset_table.cpp", "strings.cpp",  "istream.cpp",  "standard.cpp",  "exception.cpp",
-        "load_library.cpp", "portable.cpp", "pipe.cpp",     "vthread.cpp",   "base_util.cpp"};
-    EXPECT_THAT(units, ElementsAreArray(expected));
+    EXPECT_THAT(units, ElementsAreArray(kel::test::initialised_units()));
 }
 
 // ---- what they build ----

@@ -81,11 +81,12 @@ Outcome start_and_wait(const std::string& input, const std::function<void()>& in
         in_the_child();
         ::_exit(98);
     }
-    in.close_end(0);
     out.close_end(1);
     err.close_end(1);
-    // Inputs of tests are shorter than a pipe holds, so this cannot block.
+    // Inputs of tests are shorter than a pipe holds, so this cannot block. The child may have ended already;
+    // as long as the reading end is open here too, that is no broken pipe.
     if (!input.empty() && ::write(in.ends[1], input.data(), input.size()) < 0) std::perror("write");
+    in.close_end(0);
     in.close_end(1);
     Outcome outcome;
     collect(out, err, outcome);

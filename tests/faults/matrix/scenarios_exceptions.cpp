@@ -1,6 +1,7 @@
 // Exceptions: made, copied, thrown, sent as text and brought back from it.
 //
 // SPDX-License-Identifier: MIT
+#include <kel/exceptions/explain.h>
 #include <kel/exceptions/standard.h>
 #include <kel/services/environment.h>
 #include <kel/services/load_library.h>
@@ -48,6 +49,19 @@ class ExceptionIsCopied : public ExceptionScenario {
     }
 };
 KEL_SCENARIO(ExceptionIsCopied).giving("CORBA::MARSHAL").and_retried();
+
+class ExceptionIsExplained : public ExceptionScenario {
+    void act() override {
+        const CORBA_String_var line(kel_explain(_exception));
+        gives("%s", line.in());
+    }
+};
+KEL_SCENARIO(ExceptionIsExplained)
+    .giving(std::string(
+                "IDL:omg.org/CORBA/MARSHAL:1.0: minor 0x4f4d0007 (vendor set 0x4f4d0000 OMG, code 0x007): "
+                "no words for this code; completion status MAYBE; ") +
+            reason)
+    .and_retried();
 
 class UserExceptionIsCopied : public Scenario {
     void act() override {
