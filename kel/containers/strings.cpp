@@ -22,6 +22,9 @@ int compare_text(const char* a, const char* b) {
     return std::strcmp(a, b);
 }
 
+// A byte of 0x80 and above fills the upper bits with ones.
+std::uint32_t widened(char c) { return static_cast<std::uint32_t>(static_cast<signed char>(c)); }
+
 // A length from a peer may be any number. What no string of a 32-bit process can hold is refused at
 // 64 bits too, so that a false length ends alike at both widths.
 const unsigned long largest_string = 0x7fffffff;
@@ -69,8 +72,15 @@ void CORBA::string_free(char* s) {
 
 unsigned long CORBA::hash(const char* s) {
     if (s == 0) return 0;
+    // Two characters a step: each waits for the one before it, which takes half as long this way.
     std::uint32_t h = 0;
-    for (; *s != 0; ++s) h = (h << 1) ^ static_cast<std::uint32_t>(static_cast<signed char>(*s));
+    for (; *s != 0; s += 2) {
+        if (s[1] == 0) {
+            h = (h << 1) ^ widened(s[0]);
+            break;
+        }
+        h = (h << 2) ^ (widened(s[0]) << 1) ^ widened(s[1]);
+    }
     return h & 0x7fffffff;
 }
 

@@ -22,6 +22,15 @@
 #include <kel/config.h>
 #include <pthread.h>
 
+#ifndef KEL_INLINE_MUTEX
+// What the definitions in line begin with; empty in the unit that owns them.
+#define KEL_INLINE_MUTEX KEL_INLINE
+#endif
+
+// The library's own mutexes are zero before they are built and stay as they are when they are destroyed.
+// Both times they can be locked, while a sanitizer would find no object there.
+#define KEL_OBJECT_OR_NOT __attribute__((no_sanitize("vptr")))
+
 class KEL_API KEL_CAPABILITY("mutex") KELIMutex {
 public:
     KELIMutex() = default;
@@ -130,5 +139,112 @@ public:
     KELMutex* _mtx;
     unsigned char _locked;  // non-zero: the destructor unlocks
 };
+
+namespace kel {
+namespace internal {
+
+// Which operation the system refused. The reports are written where the library is, not here.
+enum MutexUse { kMutexLock, kMutexUnlock, kRMutexLock, kRMutexUnlock };
+
+// Prints the name of the call and ends the process, or throws NO_RESOURCES.
+[[noreturn]] KEL_API __attribute__((cold)) void mutex_use_failed(MutexUse use);
+[[noreturn]] KEL_API __attribute__((cold)) void mutex_init_failed();
+
+}  // namespace internal
+}  // namespace kel
+
+KEL_INLINE_BEGIN
+
+KEL_INLINE_MUTEX KELIMutex::~KELIMutex() {}
+
+KEL_INLINE_MUTEX KELMutex::KELMutex() {
+    const int rc = pthread_mutex_init(&_mutex, 0);
+    if (rc != 0) kel::internal::mutex_init_failed();
+}
+
+// The attribute object is a member and the results of its two calls are not looked at: should they
+// fail, pthread_mutex_init says so.
+//
+// Deliberate: a failed pthread_mutex_init leaves the attribute object undestroyed; it owns nothing.
+// Pinned by RecursiveMutex.FailedCreationLeavesTheAttributesUndestroyed.
+KEL_INLINE_MUTEX KELRMutex::KELRMutex() {
+    pthread_mutexattr_init(&_attributes);
+    pthread_mutexattr_settype(&_attributes, PTHREAD_MUTEX_RECURSIVE);
+    const int rc = pthread_mutex_init(&_mutex, &_attributes);
+    if (rc != 0) kel::internal::mutex_init_failed();
+    pthread_mutexattr_destroy(&_attributes);
+}
+
+KEL_OBJECT_OR_NOT KEL_INLINE_MUTEX void KELMutex::lock() {
+    const int rc = pthread_mutex_lock(&_mutex);
+    if (rc != 0) kel::internal::mutex_use_failed(kel::internal::kMutexLock);
+}
+
+KEL_OBJECT_OR_NOT KEL_INLINE_MUTEX void KELMutex::unlock() {
+    const int rc = pthread_mutex_unlock(&_mutex);
+    if (rc != 0) kel::internal::mutex_use_failed(kel::internal::kMutexUnlock);
+}
+
+KEL_OBJECT_OR_NOT KEL_INLINE_MUTEX void KELRMutex::lock() {
+    const int rc = pthread_mutex_lock(&_mutex);
+    if (rc != 0) kel::internal::mutex_use_failed(kel::internal::kRMutexLock);
+}
+
+KEL_OBJECT_OR_NOT KEL_INLINE_MUTEX void KELRMutex::unlock() {
+    const int rc = pthread_mutex_unlock(&_mutex);
+    if (rc != 0) kel::internal::mutex_use_failed(kel::internal::kRMutexUnlock);
+}
+
+// Deliberate: the flag does not decide whether the guard locks. With 0 the mutex stays locked when the
+// guard is gone: that is how a scope hands a locked mutex over to its caller.
+// Pinned by MutexGuard.FlagZeroLeavesTheMutexLocked.
+KEL_OBJECT_OR_NOT KEL_INLINE_MUTEX KELMutex_var::KELMutex_var(KELMutex& m, unsigned char flag)
+    : _mtx(m), _locked(flag) {
+    m.lock();
+}
+
+KEL_OBJECT_OR_NOT KEL_INLINE_MUTEX KELMutex_var::~KELMutex_var() {
+    if (_locked) _mtx.unlock();
+}
+
+// Deliberate: the flag is not looked at first. A guard with flag 0 may have handed its mutex over, so the
+// flag does not tell whether the mutex is held. Pinned by MutexGuard.LockDoesNotTestTheFlag.
+KEL_OBJECT_OR_NOT KEL_INLINE_MUTEX void KELMutex_var::lock() {
+    _mtx.lock();
+    _locked = 1;
+}
+
+KEL_OBJECT_OR_NOT KEL_INLINE_MUTEX void KELMutex_var::unlock() {
+    _mtx.unlock();
+    _locked = 0;
+}
+
+KEL_OBJECT_OR_NOT KEL_INLINE_MUTEX KELRMutex_var::KELRMutex_var(KELRMutex& m, unsigned char flag)
+    : _mtx(m), _locked(flag) {
+    m.lock();
+}
+
+KEL_OBJECT_OR_NOT KEL_INLINE_MUTEX KELRMutex_var::~KELRMutex_var() {
+    if (_locked) _mtx.unlock();
+}
+
+KEL_OBJECT_OR_NOT KEL_INLINE_MUTEX void KELRMutex_var::lock() {
+    _mtx.lock();
+    _locked = 1;
+}
+
+KEL_OBJECT_OR_NOT KEL_INLINE_MUTEX void KELRMutex_var::unlock() {
+    _mtx.unlock();
+    _locked = 0;
+}
+
+// A mutex that ends in line belongs to whoever ends it. The library's own locks end at exit through the
+// library's copy of the destructor, which leaves them usable.
+#ifndef KEL_MUTEX_OWNER
+KEL_INLINE_MUTEX KELMutex::~KELMutex() { pthread_mutex_destroy(&_mutex); }
+KEL_INLINE_MUTEX KELRMutex::~KELRMutex() { pthread_mutex_destroy(&_mutex); }
+#endif
+
+KEL_INLINE_END
 
 #endif

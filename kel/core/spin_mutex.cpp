@@ -1,4 +1,8 @@
 // SPDX-License-Identifier: MIT
+
+// The operations that callers have in line are defined here.
+#define KEL_INLINE_SPIN_MUTEX
+
 #include <kel/core/internal/scoped_lock.h>
 #include <kel/core/spin_mutex.h>
 
@@ -20,14 +24,6 @@ KELSpinMutex::~KELSpinMutex() { KELSpinMutexImplFactory::instance()->destroy(_im
 
 void KELSpinMutex::v_lock() { lock(); }
 void KELSpinMutex::v_unlock() { unlock(); }
-
-void KELSpinMutex::lock() {
-    if (_impl != nullptr) _impl->lock();
-}
-
-void KELSpinMutex::unlock() {
-    if (_impl != nullptr) _impl->unlock();
-}
 
 // The pools stand in static storage and are never destroyed: detached threads go on using them while
 // the process exits.
@@ -63,14 +59,6 @@ KELRSpinMutex::~KELRSpinMutex() { KELRSpinMutexImplFactory::instance()->destroy(
 
 void KELRSpinMutex::v_lock() { lock(); }
 void KELRSpinMutex::v_unlock() { unlock(); }
-
-void KELRSpinMutex::lock() {
-    if (_impl != nullptr) _impl->lock();
-}
-
-void KELRSpinMutex::unlock() {
-    if (_impl != nullptr) _impl->unlock();
-}
 
 KELRSpinMutexImplFactory* KELRSpinMutexImplFactory::instance() {
     alignas(KELRSpinMutexImplFactory) static unsigned char storage[sizeof(KELRSpinMutexImplFactory)];

@@ -18,6 +18,11 @@
 
 #include <kel/core/mutex.h>
 
+#ifndef KEL_INLINE_SPIN_MUTEX
+// What the definitions in line begin with; empty in the unit that owns them.
+#define KEL_INLINE_SPIN_MUTEX KEL_INLINE
+#endif
+
 class KEL_API KELSpinMutexImpl : public KELMutex {};
 class KEL_API KELRSpinMutexImpl : public KELRMutex {};
 
@@ -102,5 +107,25 @@ private:
     KELSpinMutex _guard;
     KELRSpinMutexImpl* _free[32] KEL_GUARDED_BY(_guard);
 };
+
+KEL_INLINE_BEGIN
+
+KEL_INLINE_SPIN_MUTEX void KELSpinMutex::lock() {
+    if (_impl != 0) _impl->lock();
+}
+
+KEL_INLINE_SPIN_MUTEX void KELSpinMutex::unlock() {
+    if (_impl != 0) _impl->unlock();
+}
+
+KEL_INLINE_SPIN_MUTEX void KELRSpinMutex::lock() {
+    if (_impl != 0) _impl->lock();
+}
+
+KEL_INLINE_SPIN_MUTEX void KELRSpinMutex::unlock() {
+    if (_impl != 0) _impl->unlock();
+}
+
+KEL_INLINE_END
 
 #endif

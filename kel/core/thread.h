@@ -24,6 +24,11 @@
 #include <kel/core/mutex.h>
 #include <pthread.h>
 
+#ifndef KEL_INLINE_THREAD
+// What the definitions in line begin with; empty in the unit that owns them.
+#define KEL_INLINE_THREAD KEL_INLINE
+#endif
+
 // A thread object's identifier is replaced by its new thread while others read it, so each access
 // is one relaxed load or store.
 class KEL_API KELThreadId {
@@ -48,8 +53,23 @@ private:
 
 // 0 when the identifiers are equal, otherwise their order as numbers.
 KEL_API int compare(const KELThreadId& a, const KELThreadId& b);
-// A number made of the identifier.
+
+// 32 bits in either word size, as for every hash.
 KEL_API unsigned long _kel_hash(const KELThreadId& id);
+
+KEL_INLINE_BEGIN
+
+KEL_INLINE_THREAD int compare(const KELThreadId& a, const KELThreadId& b) {
+    const pthread_t x = a.id();
+    const pthread_t y = b.id();
+    return x < y ? -1 : x > y;
+}
+
+KEL_INLINE_THREAD unsigned long _kel_hash(const KELThreadId& id) {
+    return static_cast<std::uint32_t>(id.id());
+}
+
+KEL_INLINE_END
 
 class KEL_API KELThread {
 public:

@@ -1,4 +1,8 @@
 // SPDX-License-Identifier: MIT
+
+// The operations that callers have in line are defined here.
+#define KEL_INLINE_UNIQUE_ID
+
 #include <kel/core/mutex.h>
 #include <kel/core/unique_id.h>
 
@@ -18,9 +22,3 @@ KELUniqueId::KELUniqueId() {
     KELMutex_var hold(*lock, 1);
     _value = _globalId++;
 }
-
-int compare(const KELUniqueId& a, const KELUniqueId& b) {
-    return a.value() < b.value() ? -1 : a.value() > b.value();
-}
-
-unsigned long _kel_hash(const KELUniqueId& id) { return id.value(); }

@@ -13,6 +13,11 @@
 
 #include <kel/config.h>
 
+#ifndef KEL_INLINE_UNIQUE_ID
+// What the definitions in line begin with; empty in the unit that owns them.
+#define KEL_INLINE_UNIQUE_ID KEL_INLINE
+#endif
+
 class KEL_API KELUniqueId {
 public:
     // Draws the next integer. Throws CORBA::NO_RESOURCES when the lock of the counter, made by the
@@ -40,5 +45,15 @@ KEL_API int compare(const KELUniqueId& a, const KELUniqueId& b);
 
 // The integer itself.
 KEL_API unsigned long _kel_hash(const KELUniqueId& id);
+
+KEL_INLINE_BEGIN
+
+KEL_INLINE_UNIQUE_ID int compare(const KELUniqueId& a, const KELUniqueId& b) {
+    return a.value() < b.value() ? -1 : a.value() > b.value();
+}
+
+KEL_INLINE_UNIQUE_ID unsigned long _kel_hash(const KELUniqueId& id) { return id.value(); }
+
+KEL_INLINE_END
 
 #endif

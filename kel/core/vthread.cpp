@@ -1,6 +1,12 @@
 // SPDX-License-Identifier: MIT
 // Mutexes, guards, conditions and threads. Every wrapper that ends the process when a thread call
 // fails stands in this unit: the report names "vthread" and one of its lines.
+
+// The operations that callers have in line are defined here.
+#define KEL_INLINE_MUTEX
+#define KEL_INLINE_THREAD
+#define KEL_MUTEX_OWNER
+
 #include <kel/core/condition.h>
 #include <kel/core/internal/failure.h>
 #include <kel/core/mutex.h>
@@ -43,18 +49,31 @@ bool outlives_exit(const KELIMutex* mutex) {
 
 }  // namespace
 
-// These mutexes are zero before they are built and stay as they are when they are destroyed. Both times
-// they can be locked, while a sanitizer would find no object there.
-#define KEL_OBJECT_OR_NOT __attribute__((no_sanitize("vptr")))
-
 // --- mutexes -----------------------------------------------------------------------------------------
 
-KELIMutex::~KELIMutex() = default;
+namespace kel {
+namespace internal {
 
-KELMutex::KELMutex() {
-    const int rc = pthread_mutex_init(&_mutex, nullptr);
-    if (rc != 0) create_failed("pthread_mutex_init");
+void mutex_init_failed() { create_failed("pthread_mutex_init"); }
+
+// Deliberate: a failed unlock of a plain mutex is headed by the name of the lock call; log filters look for
+// that line. Pinned by Mutex.FailedUnlockNamesTheLockCall.
+void mutex_use_failed(MutexUse use) {
+    static const struct {
+        const char* call;
+        unsigned line;
+        const char* function;
+    } reports[] = {
+        {"pthread_mutex_lock", __LINE__, "void KELMutex::lock()"},
+        {"pthread_mutex_lock", __LINE__, "void KELMutex::unlock()"},
+        {"pthread_mutex_lock", __LINE__, "void KELRMutex::lock()"},
+        {"pthread_mutex_unlock", __LINE__, "void KELRMutex::unlock()"},
+    };
+    use_failed(reports[use].call, "(rc == 0)", reports[use].line, reports[use].function);
 }
+
+}  // namespace internal
+}  // namespace kel
 
 KELMutex::~KELMutex() {
     if (!outlives_exit(this)) pthread_mutex_destroy(&_mutex);
@@ -63,31 +82,6 @@ KELMutex::~KELMutex() {
 void KELMutex::v_lock() { lock(); }
 void KELMutex::v_unlock() { unlock(); }
 
-KEL_OBJECT_OR_NOT void KELMutex::lock() {
-    const int rc = pthread_mutex_lock(&_mutex);
-    if (rc != 0) use_failed("pthread_mutex_lock", "(rc == 0)", __LINE__, "void KELMutex::lock()");
-}
-
-// Deliberate: a failed unlock is headed by the name of the lock call; log filters look for that line.
-// Pinned by Mutex.FailedUnlockNamesTheLockCall.
-KEL_OBJECT_OR_NOT void KELMutex::unlock() {
-    const int rc = pthread_mutex_unlock(&_mutex);
-    if (rc != 0) use_failed("pthread_mutex_lock", "(rc == 0)", __LINE__, "void KELMutex::unlock()");
-}
-
-// The attribute object is a member and the results of its two calls are not looked at: should they
-// fail, pthread_mutex_init says so.
-//
-// Deliberate: a failed pthread_mutex_init leaves the attribute object undestroyed; it owns nothing.
-// Pinned by RecursiveMutex.FailedCreationLeavesTheAttributesUndestroyed.
-KELRMutex::KELRMutex() {
-    pthread_mutexattr_init(&_attributes);
-    pthread_mutexattr_settype(&_attributes, PTHREAD_MUTEX_RECURSIVE);
-    const int rc = pthread_mutex_init(&_mutex, &_attributes);
-    if (rc != 0) create_failed("pthread_mutex_init");
-    pthread_mutexattr_destroy(&_attributes);
-}
-
 KELRMutex::~KELRMutex() {
     if (!outlives_exit(this)) pthread_mutex_destroy(&_mutex);
 }
@@ -95,58 +89,7 @@ KELRMutex::~KELRMutex() {
 void KELRMutex::v_lock() { lock(); }
 void KELRMutex::v_unlock() { unlock(); }
 
-KEL_OBJECT_OR_NOT void KELRMutex::lock() {
-    const int rc = pthread_mutex_lock(&_mutex);
-    if (rc != 0) use_failed("pthread_mutex_lock", "(rc == 0)", __LINE__, "void KELRMutex::lock()");
-}
-
-KEL_OBJECT_OR_NOT void KELRMutex::unlock() {
-    const int rc = pthread_mutex_unlock(&_mutex);
-    if (rc != 0) use_failed("pthread_mutex_unlock", "(rc == 0)", __LINE__, "void KELRMutex::unlock()");
-}
-
 // --- guards ------------------------------------------------------------------------------------------
-
-// Deliberate: the flag does not decide whether the guard locks. With 0 the mutex stays locked when the
-// guard is gone: that is how a scope hands a locked mutex over to its caller.
-// Pinned by MutexGuard.FlagZeroLeavesTheMutexLocked.
-KEL_OBJECT_OR_NOT KELMutex_var::KELMutex_var(KELMutex& m, unsigned char flag) : _mtx(m), _locked(flag) {
-    m.lock();
-}
-
-KEL_OBJECT_OR_NOT KELMutex_var::~KELMutex_var() {
-    if (_locked) _mtx.unlock();
-}
-
-// Deliberate: the flag is not looked at first. A guard with flag 0 may have handed its mutex over, so the
-// flag does not tell whether the mutex is held. Pinned by MutexGuard.LockDoesNotTestTheFlag.
-KEL_OBJECT_OR_NOT void KELMutex_var::lock() {
-    _mtx.lock();
-    _locked = 1;
-}
-
-KEL_OBJECT_OR_NOT void KELMutex_var::unlock() {
-    _mtx.unlock();
-    _locked = 0;
-}
-
-KEL_OBJECT_OR_NOT KELRMutex_var::KELRMutex_var(KELRMutex& m, unsigned char flag) : _mtx(m), _locked(flag) {
-    m.lock();
-}
-
-KEL_OBJECT_OR_NOT KELRMutex_var::~KELRMutex_var() {
-    if (_locked) _mtx.unlock();
-}
-
-KEL_OBJECT_OR_NOT void KELRMutex_var::lock() {
-    _mtx.lock();
-    _locked = 1;
-}
-
-KEL_OBJECT_OR_NOT void KELRMutex_var::unlock() {
-    _mtx.unlock();
-    _locked = 0;
-}
 
 KELDMutex_var::KELDMutex_var(KELMutex* m, unsigned char flag) : _mtx(m), _locked(flag) {
     if (m != nullptr) m->lock();
@@ -263,15 +206,6 @@ void KELCondition::broadcast() {
 }
 
 // --- threads -----------------------------------------------------------------------------------------
-
-int compare(const KELThreadId& a, const KELThreadId& b) {
-    const pthread_t x = a.id();
-    const pthread_t y = b.id();
-    return x < y ? -1 : x > y;
-}
-
-// 32 bits in either word size, as for every hash.
-unsigned long _kel_hash(const KELThreadId& id) { return static_cast<std::uint32_t>(id.id()); }
 
 KELThread::KELThread(long stacksize)
     : _tid(pthread_self()), _next(nullptr), _prev(nullptr), _stacksize(stacksize) {

@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include <kel/exceptions/internal/downcast.h>
+#include <kel/exceptions/internal/raise_copy.h>
 #include <kel/exceptions/standard.h>
 
 #include <iostream>
@@ -27,7 +28,7 @@ static std::ios_base::Init standard_streams;
         : KELStdException(minor, completed, _description, _factory) {}                                    \
     CORBA_##X::CORBA_##X(unsigned long minor, CORBA::CompletionStatus completed, const char* reason)      \
         : KELStdException(minor, completed, reason, _description, _factory) {}                            \
-    void CORBA_##X::_raise() const { throw *this; }                                                       \
+    void CORBA_##X::_raise() const { kel::internal::raise_copy(*this); }                                  \
     CORBA_Exception* CORBA_##X::_factory() { return new CORBA_##X; }                                      \
     CORBA_##X* CORBA_##X::_downcast(CORBA_Exception* e) { return kel::internal::downcast<CORBA_##X>(e); } \
     const CORBA_##X* CORBA_##X::_downcast(const CORBA_Exception* e) {                                     \

@@ -112,10 +112,14 @@ class Workshop:
     def library(self, folder, texts):
         """The folder of the library with the changed `texts`: the plain one when no unit changes.
 
-        A private header changes the units that include it. A public one is compiled into the tests.
+        A private header changes the units that include it. A public one is compiled into the tests, and into
+        the units that define what it has in line.
         """
         private = {f for f in texts if "/internal/" in f}
         changed = {o: f for f, o in self.units.items() if f in texts or private & self.deps.get(o, set())}
+        for unit, made in self.units.items():
+            if texts.keys() & self.deps.get(made, set()) and "#define KEL_INLINE_" in (self.root / unit).read_text():
+                changed[made] = unit
         if not changed:
             return self.folder / "plain"
         made = {}

@@ -1,0 +1,3 @@
+// SPDX-License-Identifier: MIT
+// The least that can be opened.
+extern "C" void empty() {}
