@@ -248,11 +248,8 @@ protected:
     }
 
     ~HashTable() {
-        if (_on_remove == 0 && std::is_trivially_destructible<Assoc>::value) {
-            delete_entries();
-        } else {
-            removeAll();
-        }
+        const bool unheard = _on_remove == 0 && std::is_trivially_destructible<Assoc>::value;
+        unheard ? delete_entries() : removeAll();
         if (_table != _inline_table) delete[] _table;
         while (_pool_head._free_count > 0) delete _pool[--_pool_head._free_count];
     }
