@@ -184,8 +184,7 @@ const char* const hostile[] = {
     "\xff",
     "5\xff",
     "1\x80",
-    "\xa0"
-    "5",
+    "\2405",
 };
 
 const Dress dresses[] = {
