@@ -27,8 +27,8 @@ namespace test {
 
 class LogFolder {
 public:
-    LogFolder() {
-        _path = ::testing::TempDir() + "kel-log-XXXXXX";
+    explicit LogFolder(const std::string& where = ::testing::TempDir()) {
+        _path = where + "kel-log-XXXXXX";
         if (::mkdtemp(&_path[0]) == nullptr) std::abort();
     }
     ~LogFolder() {

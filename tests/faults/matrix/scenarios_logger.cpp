@@ -4,6 +4,7 @@
 #include <kel/services/debug_logger.h>
 
 #include <cstdio>
+#include <cstdlib>
 #include <memory>
 #include <string>
 
@@ -18,6 +19,13 @@ using namespace kel::test;
 const unsigned int module = 0x10000001;
 
 void write_line(KELDebugLogger& log) { log.start(3, module, "server.cpp", 42) << "text" << 7l << endl; }
+
+// Beside the figures, whose folder is made anew for each run: a scenario that ends its process leaves its
+// files.
+std::string where_files_go() {
+    const char* const figures = std::getenv("KEL_FIGURES");
+    return figures != nullptr ? std::string(figures) + "/" : ::testing::TempDir();
+}
 
 // A logger on a file in a folder of its own; the clock stands still.
 class LogScenario : public Scenario {
@@ -38,7 +46,7 @@ protected:
               exists(_backup) ? static_cast<int>(text_of(_backup).size()) : -1);
     }
 
-    const LogFolder _folder;
+    const LogFolder _folder{where_files_go()};
     const std::string _path = _folder.file("log");
     const std::string _backup = _path + "o";
     std::unique_ptr<KELDebugLogger> _log;
