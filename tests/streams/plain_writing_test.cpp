@@ -351,10 +351,15 @@ TEST(PlainWriting, KeepsWhatFitsWhenThereIsNoMemoryForMore) {
         return end + seen(text) + " offset " + std::to_string(out.cur_out_offset()) + ": " + text.str();
     };
     const int ints[] = {-1, 20, 300};
+    const std::string longer_than_a_block(700, 'x');
     const std::function<void(KELostream&)> works[] = {
-        [](KELostream& out) { out << -123; },     [](KELostream& out) { out << -0.25; },
-        [](KELostream& out) { out << 'c'; },      [](KELostream& out) { out.putCString("a\"b\x01"); },
-        [](KELostream& out) { out << "string"; }, [&](KELostream& out) { out.put(ints, 3); },
+        [](KELostream& out) { out << -123; },
+        [](KELostream& out) { out << -0.25; },
+        [](KELostream& out) { out << 'c'; },
+        [](KELostream& out) { out.putCString("a\"b\x01"); },
+        [](KELostream& out) { out << "string"; },
+        [&](KELostream& out) { out.put(ints, 3); },
+        [&](KELostream& out) { out.putCString(longer_than_a_block.c_str()); },
     };
     for (const auto& work : works) {
         for (std::size_t before = 570; before <= 600; ++before) {
