@@ -154,9 +154,9 @@ enum MutexUse { kMutexLock, kMutexUnlock, kRMutexLock, kRMutexUnlock };
 }  // namespace kel
 
 KEL_INLINE_BEGIN
-
+#if !defined(__clang__) || defined(KEL_MUTEX_OWNER)  // clang makes the class's tables where it sees this
 KEL_INLINE_MUTEX KELIMutex::~KELIMutex() {}
-
+#endif
 KEL_INLINE_MUTEX KELMutex::KELMutex() {
     const int rc = pthread_mutex_init(&_mutex, 0);
     if (rc != 0) kel::internal::mutex_init_failed();
