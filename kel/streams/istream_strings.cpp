@@ -130,6 +130,18 @@ char read_escape(std::istream& in, std::uint32_t& offset) {
 // Whether a character inside the quotes will be stored, by itself or with its escape.
 bool takes_room(int c) { return c != '"' && c != '\n' && c != end_of_input; }
 
+// Reads the characters that need no look at each of them: by the block as long as that works and there is
+// room for one.
+AfterBlock read_ahead(std::istream& in, QuotedTarget& to, bool& by_blocks) {
+    if (!by_blocks || to.room < smallest_block) {
+        read_run(in, to);
+        return AfterBlock::odd;
+    }
+    const AfterBlock after = read_block(in, to);
+    by_blocks = after == AfterBlock::open;
+    return after;
+}
+
 // The form of std::cin: one word into the caller's own buffer. There is nothing to allocate and no
 // way to know the room, so a missing buffer fails the stream.
 void read_word(std::istream& in, char* s, std::uint32_t& offset) {
@@ -187,47 +199,38 @@ KEListream& KEListream::getCString(char* buf, unsigned int len) {
     _offset += 1;
     if (!quoted) return *this;
 
+    QuotedTarget to = {buf, len, _offset};
     const bool by_runs = is_plain(in) && is_over_string(in);
     bool by_blocks = by_runs;
     for (;;) {
-        if (by_runs && len > 0 && in.good()) {
-            QuotedTarget target = {buf, len, _offset};
-            AfterBlock after = AfterBlock::odd;
-            if (by_blocks && len >= smallest_block) {
-                after = read_block(in, target);
-                by_blocks = after == AfterBlock::open;
-            } else {
-                read_run(in, target);
-            }
-            buf = target.buf;
-            len = target.room;
-            _offset = target.offset;
+        if (by_runs && to.room > 0 && in.good()) {
+            const AfterBlock after = read_ahead(in, to, by_blocks);
             if (after == AfterBlock::closed) break;
             if (after == AfterBlock::open) continue;
         }
-        if (len == 0 && takes_room(in.peek())) {  // and stays unread
+        if (to.room == 0 && takes_room(in.peek())) {  // and stays unread
             _offset += 1;
             report_overflow();
             return *this;
         }
         const int c = in.get();
         if (c == '"') {
-            if (len == 0) return *this;
+            if (to.room == 0) return *this;
             break;
         }
         if (c == end_of_input) {
             // Every further read would give the same, up to the overflow.
-            std::fill_n(buf, len, '\xff');
-            _offset += len + 1;
+            std::fill_n(to.buf, to.room, '\xff');
+            _offset += to.room + 1;
             report_overflow();
             return *this;
         }
         _offset += 1;
         if (c == '\n') continue;
-        --len;
-        *buf++ = c == '\\' ? read_escape(in, _offset) : static_cast<char>(c);
+        --to.room;
+        *to.buf++ = c == '\\' ? read_escape(in, _offset) : static_cast<char>(c);
     }
-    *buf = '\0';
+    *to.buf = '\0';
     in.get();
     _offset += 1;
     return *this;

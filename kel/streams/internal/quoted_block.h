@@ -14,7 +14,7 @@ namespace internal {
 struct QuotedTarget {
     char* buf;
     std::uint32_t room;  // bytes that may still be stored
-    std::uint32_t offset;
+    std::uint32_t& offset;
 };
 
 enum class AfterBlock {
