@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include <kel/streams/internal/decimals.h>
 #include <kel/streams/internal/digits.h>
+#include <kel/streams/internal/uninitialized.h>
 
 #include <cfenv>
 #include <cstring>
@@ -65,8 +66,13 @@ struct Rounded {
     bool decided;  // the number is not so close to the middle that its error matters
 };
 
-// The C library rounds as the thread has told the processor to.
-bool rounds_to_nearest() { return std::fegetround() == FE_TONEAREST; }
+// The C library rounds as the thread has told the processor to. Asked as std::fegetround does, whose call
+// would take longer than a number's digits.
+bool rounds_to_nearest() {
+    std::uint16_t control;
+    __asm__ volatile("fnstcw %0" : "=m"(control));
+    return (control & (FE_DOWNWARD | FE_UPWARD | FE_TOWARDZERO)) == FE_TONEAREST;
+}
 
 // ---- showing ----
 
@@ -98,7 +104,7 @@ char* put_exponent(char* at, int exponent) {
 // Six digits of which the first stands for 10^exponent, as "%g" shows them: without zeros at the end,
 // and with an exponent only below -4 and from 6 on.
 char* put_general(char* at, std::uint32_t six, int exponent) {
-    char eight[2 + 2 * shown_digits];
+    KEL_UNINITIALIZED char eight[2 + 2 * shown_digits];
     put_eight(eight, six);
     const char* const digits = eight + 2;
     int n = shown_digits;
@@ -124,7 +130,7 @@ bool six_digits(std::uint64_t bits, int top, std::uint32_t& six, int& exponent) 
         const std::uint64_t scaled = high_product(bits, significand_of_power(power));
         const int surplus = 62 - top - twos_in_ten_to(power);
         if (scaled >> surplus >= smallest_above) continue;
-        const Rounded rounded(scaled, surplus);
+        KEL_UNINITIALIZED const Rounded rounded(scaled, surplus);
         six = static_cast<std::uint32_t>(rounded.whole);
         if (six == smallest_above) {
             six = smallest_shown;
@@ -136,12 +142,15 @@ bool six_digits(std::uint64_t bits, int top, std::uint32_t& six, int& exponent) 
 
 // ---- reading ----
 
+// The value is put together and stored as an integer: a processor that was to load it as a float just then
+// would wait for both halves.
 template <class Float, class Bits>
-bool nearest(std::uint64_t digits, int exponent, Float& value) {
+bool nearest(bool negative, std::uint64_t digits, int exponent, Float& value) {
     constexpr int precision = std::numeric_limits<Float>::digits;
     constexpr int bias = std::numeric_limits<Float>::max_exponent - 1;
+    const Bits sign = static_cast<Bits>(negative) << (8 * sizeof(Bits) - 1);
     if (digits == 0) {
-        value = 0;
+        std::memcpy(&value, &sign, sizeof value);
         return true;
     }
     if (exponent < -largest_power || exponent > largest_power || !rounds_to_nearest()) return false;
@@ -150,11 +159,11 @@ bool nearest(std::uint64_t digits, int exponent, Float& value) {
     const int first = static_cast<int>(product >> 63);
     const int top = 63 - unused + twos_in_ten_to(exponent) + first;
     if (top >= bias) return false;
-    const Rounded rounded(product, 63 - precision + first);
+    KEL_UNINITIALIZED const Rounded rounded(product, 63 - precision + first);
     if (!rounded.decided) return false;
     // The first bit is not stored: it raises the exponent by one, and by two when all bits were rounded up.
     const Bits bits =
-        (static_cast<Bits>(top + bias - 1) << (precision - 1)) + static_cast<Bits>(rounded.whole);
+        sign + (static_cast<Bits>(top + bias - 1) << (precision - 1)) + static_cast<Bits>(rounded.whole);
     std::memcpy(&value, &bits, sizeof value);
     return true;
 }
@@ -180,12 +189,12 @@ char* show_decimal(char* at, double value) {
     return put_general(at, six, exponent);
 }
 
-bool decimal_value(std::uint64_t digits, int exponent, double& value) {
-    return nearest<double, std::uint64_t>(digits, exponent, value);
+bool decimal_value(bool negative, std::uint64_t digits, int exponent, double& value) {
+    return nearest<double, std::uint64_t>(negative, digits, exponent, value);
 }
 
-bool decimal_value(std::uint64_t digits, int exponent, float& value) {
-    return nearest<float, std::uint32_t>(digits, exponent, value);
+bool decimal_value(bool negative, std::uint64_t digits, int exponent, float& value) {
+    return nearest<float, std::uint32_t>(negative, digits, exponent, value);
 }
 
 }  // namespace internal

@@ -7,7 +7,7 @@
 
 #include <iostream>
 
-using kel::internal::read_value;
+using kel::internal::read_item;
 using kel::internal::TableList;
 using kel::internal::text;
 
@@ -73,9 +73,7 @@ namespace {
 // Reads one value and the separator behind it. `size` is what the value itself counts.
 template <class T>
 KEListream& extract(KEListream& in, T& value, std::uint32_t size) {
-    std::istream& stream = text(in._strm);
-    read_value(stream, value);
-    stream.get();
+    read_item(text(in._strm), value);
     in._offset += size + 1;
     return in;
 }

@@ -1,9 +1,10 @@
 // SPDX-License-Identifier: MIT
 #include <kel/containers/strings.h>
+#include <kel/streams/internal/areas.h>
 #include <kel/streams/internal/console.h>
 #include <kel/streams/internal/escapes.h>
 #include <kel/streams/internal/plain.h>
-#include <kel/streams/internal/quoted_block.h>
+#include <kel/streams/internal/quoted_text.h>
 #include <kel/streams/internal/text.h>
 #include <kel/streams/istream.h>
 
@@ -13,7 +14,6 @@
 #include <new>
 #include <string>
 
-using kel::internal::AfterBlock;
 using kel::internal::error_stream;
 using kel::internal::Escape;
 using kel::internal::escapes;
@@ -21,10 +21,10 @@ using kel::internal::is_cin;
 using kel::internal::is_over_string;
 using kel::internal::is_plain;
 using kel::internal::QuotedTarget;
-using kel::internal::read_block;
-using kel::internal::read_run;
+using kel::internal::read_quoted_text;
 using kel::internal::read_value;
-using kel::internal::smallest_block;
+using kel::internal::ReadArea;
+using kel::internal::take;
 using kel::internal::text;
 
 namespace {
@@ -50,11 +50,17 @@ wchar_t* new_wide_array(std::uint32_t n) {
     return new wchar_t[n + 1]();
 }
 
+// Consumes the opening quote if it comes next, as it does where the writer has been.
+bool take_quote(std::istream& in) {
+    const char* const at = ReadArea::begin(in);
+    if (at == ReadArea::end(in) || *at != '"') return false;
+    ReadArea::consume(in, 1);
+    return true;
+}
+
 // Consumes white space and one character, which must be the opening quote. Otherwise reports.
 bool read_opening_quote(std::istream& in) {
-    // There is no white space to skip where the writer has been, and nobody sees a look at a string buffer.
-    const bool quoted = is_plain(in) && is_over_string(in) && in.rdbuf()->sgetc() == '"';
-    if (!quoted) in >> std::ws;
+    in >> std::ws;
     const int c = in.get();
     if (in.eof()) {
         error_stream() << "KEListream::getCString: Unexpected EOF\n" << std::flush;
@@ -130,18 +136,6 @@ char read_escape(std::istream& in, std::uint32_t& offset) {
 // Whether a character inside the quotes will be stored, by itself or with its escape.
 bool takes_room(int c) { return c != '"' && c != '\n' && c != end_of_input; }
 
-// Reads the characters that need no look at each of them: by the block as long as that works and there is
-// room for one.
-AfterBlock read_ahead(std::istream& in, QuotedTarget& to, bool& by_blocks) {
-    if (!by_blocks || to.room < smallest_block) {
-        read_run(in, to);
-        return AfterBlock::odd;
-    }
-    const AfterBlock after = read_block(in, to);
-    by_blocks = after == AfterBlock::open;
-    return after;
-}
-
 // The form of std::cin: one word into the caller's own buffer. There is nothing to allocate and no
 // way to know the room, so a missing buffer fails the stream.
 void read_word(std::istream& in, char* s, std::uint32_t& offset) {
@@ -195,25 +189,20 @@ KEListream& KEListream::operator>>(char*& s) {
 
 KEListream& KEListream::getCString(char* buf, unsigned int len) {
     std::istream& in = text(_strm);
-    const bool quoted = read_opening_quote(in);
+    const bool in_memory = is_plain(in) && is_over_string(in);
+    const bool quoted = (in_memory && take_quote(in)) || read_opening_quote(in);
     _offset += 1;
     if (!quoted) return *this;
 
     QuotedTarget to = {buf, len, _offset};
-    const bool by_runs = is_plain(in) && is_over_string(in);
-    bool by_blocks = by_runs;
     for (;;) {
-        if (by_runs && to.room > 0 && in.good()) {
-            const AfterBlock after = read_ahead(in, to, by_blocks);
-            if (after == AfterBlock::closed) break;
-            if (after == AfterBlock::open) continue;
-        }
+        if (in_memory && in.good()) read_quoted_text(in, to);
         if (to.room == 0 && takes_room(in.peek())) {  // and stays unread
             _offset += 1;
             report_overflow();
             return *this;
         }
-        const int c = in.get();
+        const int c = in_memory ? take(in) : in.get();
         if (c == '"') {
             if (to.room == 0) return *this;
             break;
@@ -231,7 +220,7 @@ KEListream& KEListream::getCString(char* buf, unsigned int len) {
         *to.buf++ = c == '\\' ? read_escape(in, _offset) : static_cast<char>(c);
     }
     *to.buf = '\0';
-    in.get();
+    in_memory ? take(in) : in.get();
     _offset += 1;
     return *this;
 }

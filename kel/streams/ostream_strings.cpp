@@ -1,9 +1,11 @@
 // SPDX-License-Identifier: MIT
+#include <kel/streams/internal/areas.h>
 #include <kel/streams/internal/console.h>
 #include <kel/streams/internal/escapes.h>
 #include <kel/streams/internal/plain.h>
-#include <kel/streams/internal/plain_runs.h>
+#include <kel/streams/internal/runs.h>
 #include <kel/streams/internal/text.h>
+#include <kel/streams/internal/uninitialized.h>
 #include <kel/streams/ostream.h>
 
 #include <cctype>
@@ -18,7 +20,7 @@ using kel::internal::is_plain;
 using kel::internal::plain_run;
 using kel::internal::text;
 using kel::internal::write_bare;
-using kel::internal::write_to_string;
+using kel::internal::WriteArea;
 
 namespace {
 
@@ -60,68 +62,73 @@ std::uint32_t write_quoted(std::ostream& out, char c) {
     return static_cast<std::uint32_t>(end - text);
 }
 
-// Collects characters for a string buffer, which is given them in blocks.
-class Block {
+// Puts pieces of a quoted string straight into the room that a string buffer has, and those for which there
+// is none through the stream, which makes more. What is refused there counts all the same.
+class Quoting {
 public:
-    explicit Block(std::ostream& out) : _out(out) {}
+    explicit Quoting(std::ostream& out) : _out(out) { look(); }
+    ~Quoting() { WriteArea::fill(_out, filled()); }
+    Quoting(const Quoting&) = delete;
+    Quoting& operator=(const Quoting&) = delete;
 
     void add(const char* text, std::size_t n) {
-        if (n > room()) flush();
-        if (n > room()) {
-            _out.write(text, static_cast<std::streamsize>(n));
-            _flushed += n;
+        _count += n;
+        if (n > static_cast<std::size_t>(_end - _at)) {
+            write(text, n);
             return;
         }
-        std::memcpy(_end, text, n);
-        _end += n;
+        std::memcpy(_at, text, n);
+        _at += n;
     }
+
+    void add(char c) { add(&c, 1); }
 
     void add_quoted(char c) {
-        if (room() < longest_escape) flush();
-        _end = show_quoted(_end, c);
+        KEL_UNINITIALIZED char text[longest_escape];
+        add(text, static_cast<std::size_t>(show_quoted(text, c) - text));
     }
 
-    // Writes what is left and a last character, and gives the number of characters in all.
-    std::size_t finish(char last) {
-        const std::size_t n = static_cast<std::size_t>(_end - _text);
-        if (_out.good()) {
-            write_to_string(_out, _text, _end - _text, last);
-        } else {
-            _out.put(last);  // refused
-        }
-        return _flushed + n + 1;
-    }
+    std::size_t count() const { return _count; }
 
 private:
-    std::size_t room() const { return static_cast<std::size_t>(_text + sizeof _text - _end); }
+    // There is no room behind a piece that was refused.
+    void look() {
+        _begin = WriteArea::begin(_out);
+        _end = _out.good() ? WriteArea::end(_out) : _begin;
+        _at = _begin;
+    }
 
-    void flush() {
-        _out.write(_text, _end - _text);
-        _flushed += static_cast<std::size_t>(_end - _text);
-        _end = _text;
+    std::size_t filled() const { return static_cast<std::size_t>(_at - _begin); }
+
+    void write(const char* text, std::size_t n) {
+        WriteArea::fill(_out, filled());
+        _out.write(text, static_cast<std::streamsize>(n));
+        look();
     }
 
     std::ostream& _out;
-    std::size_t _flushed = 0;
-    char* _end = _text;
-    char _text[512];
+    std::size_t _count = 0;
+    char* _begin;
+    char* _at;
+    char* _end;
 };
 
 // The quoted form. Returns the number of its characters.
-std::size_t write_in_blocks(std::ostream& out, const char* s) {
-    KEL_UNINITIALIZED Block block(out);
-    block.add("\"", 1);
+std::size_t write_quoted_runs(std::ostream& out, const char* s) {
+    KEL_UNINITIALIZED Quoting quoting(out);
+    quoting.add('"');
     for (std::size_t left = std::strlen(s); left > 0;) {
         const std::size_t run = plain_run(s, left);
-        block.add(s, run);
+        quoting.add(s, run);
         s += run;
         left -= run;
         if (left == 0) break;
-        block.add_quoted(*s++);
+        quoting.add_quoted(*s++);
         --left;
     }
-    block.add("\"", 1);
-    return block.finish('\n');
+    quoting.add('"');
+    quoting.add('\n');
+    return quoting.count();
 }
 
 }  // namespace
@@ -148,7 +155,7 @@ KELostream& KELostream::operator<<(const char* s) {
 KELostream& KELostream::putCString(const char* s) {
     std::ostream& out = text(_strm);
     if (is_plain(out) && is_over_string(out)) {
-        _offset += static_cast<std::uint32_t>(write_in_blocks(out, s));
+        _offset += static_cast<std::uint32_t>(write_quoted_runs(out, s));
         return *this;
     }
     out.put('"');

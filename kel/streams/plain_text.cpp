@@ -1,9 +1,11 @@
 // SPDX-License-Identifier: MIT
+#include <kel/streams/internal/areas.h>
 #include <kel/streams/internal/decimals.h>
 #include <kel/streams/internal/digits.h>
 #include <kel/streams/internal/plain.h>
 #include <kel/streams/internal/scan.h>
 #include <kel/streams/internal/text.h>
+#include <kel/streams/internal/uninitialized.h>
 
 namespace kel {
 namespace internal {
@@ -16,31 +18,47 @@ namespace internal {
 
 namespace {
 
-constexpr std::ptrdiff_t longest_value = longest_integer;
+constexpr std::size_t longest_value = longest_integer;
 static_assert(longest_decimal <= longest_value, "both kinds of numbers have room");
 
 // Each gives the end of the text without its separator; null when only the inserter knows it.
 template <class T>
-char* show_value(const std::ios_base&, char* at, T value) {
+char* show(const std::ios_base&, char* at, T value) {
     return show_integer(at, value);
 }
-char* show_value(const std::ios_base& stream, char* at, double value) {
+char* show(const std::ios_base& stream, char* at, double value) {
     return has_plain_precision(stream) ? show_decimal(at, value) : nullptr;
 }
-char* show_value(const std::ios_base&, char* at, char c) {
+char* show(const std::ios_base&, char* at, char c) {
     *at = c;
     return at + 1;
 }
 
-}  // namespace
+// Copies `n` characters, 2 to 24, in pieces that overlap.
+void copy_few(char* to, const char* from, std::size_t n) {
+    if (n >= 8) {
+        copy_bytes<8>(to, from);
+        if (n > 16) copy_bytes<8>(to + 8, from + 8);
+        copy_bytes<8>(to + n - 8, from + n - 8);
+    } else if (n >= 4) {
+        copy_bytes<4>(to, from);
+        copy_bytes<4>(to + n - 4, from + n - 4);
+    } else {
+        copy_bytes<2>(to, from);
+        to[n - 1] = from[n - 1];
+    }
+}
 
-void write_to_string(std::ostream& out, const char* text, std::ptrdiff_t n, char last) {
+// Writes the `n` characters of values and their separators as insertions would, of which the last one writes
+// the last separator: when one fails, those behind it are refused, and that sets failbit too.
+void write_through_buffer(std::ostream& out, const char* text, std::size_t n) {
     std::streambuf& to = *out.rdbuf();
+    const std::streamsize all_but_one = static_cast<std::streamsize>(n - 1);
     std::ios_base::iostate state = std::ios_base::badbit | std::ios_base::failbit;
     try {
-        if (to.sputn(text, n) == n) {
+        if (to.sputn(text, all_but_one) == all_but_one) {
             state = std::ios_base::badbit;
-            if (to.sputc(last) != std::char_traits<char>::eof()) return;
+            if (to.sputc(text[n - 1]) != std::char_traits<char>::eof()) return;
         }
     } catch (...) {
         // No memory for the characters: an inserter keeps that to itself as well.
@@ -48,55 +66,94 @@ void write_to_string(std::ostream& out, const char* text, std::ptrdiff_t n, char
     out.setstate(state);
 }
 
+// Writes to a stream over a string. Decimals are shown here first, since they spoil what stands behind them.
+template <class T>
+bool show_and_copy(std::ostream& out, T value) {
+    KEL_UNINITIALIZED char text[longest_value + 1];
+    char* const end = show(out, text, shown(value));
+    if (end == nullptr) return false;
+    *end = ' ';
+    const std::size_t n = static_cast<std::size_t>(end + 1 - text);
+    if (WriteArea::room(out) >= n) {
+        copy_few(WriteArea::begin(out), text, n);
+        WriteArea::fill(out, n);
+    } else {
+        write_through_buffer(out, text, n);
+    }
+    return true;
+}
+
+// Writes to any other stream, as one piece and one more for the separator.
+template <class T>
+bool show_as_one_piece(std::ostream& out, T value) {
+    KEL_UNINITIALIZED char text[longest_value];
+    char* const end = show(out, text, shown(value));
+    if (end == nullptr) return false;
+    out.write(text, end - text) << " ";
+    return true;
+}
+
+}  // namespace
+
+template <class T>
+KEL_FLATTEN bool show_value(std::ostream& out, T value) {
+    if (!is_plain(out)) return false;
+    if (!is_over_string(out)) return !std::is_same_v<T, char> && show_as_one_piece(out, value);
+    if (std::is_floating_point_v<T> || WriteArea::room(out) <= longest_value)
+        return show_and_copy(out, value);
+    char* const begin = WriteArea::begin(out);
+    char* const end = show(out, begin, shown(value));
+    *end = ' ';
+    WriteArea::fill(out, static_cast<std::size_t>(end + 1 - begin));
+    return true;
+}
+
 template <class T>
 KEL_FLATTEN unsigned int show_values(std::ostream& out, const T* values, unsigned int n) {
-    if (!is_plain(out)) return 0;
-    const bool over_string = is_over_string(out);
-    if (!over_string) {
-        if (std::is_same_v<T, char>) return 0;
-        n = 1;
-    }
-
+    if (!is_plain(out) || !is_over_string(out)) return 0;
     KEL_UNINITIALIZED char block[512];
     const char* const last_start = block + sizeof block - longest_value - 1;
     char* at = block;
     unsigned int count = 0;
     for (; count < n && at <= last_start; ++count) {
-        char* const end = show_value(out, at, shown(values[count]));
+        char* const end = show(out, at, shown(values[count]));
         if (end == nullptr) break;
         *end = ' ';
         at = end + 1;
     }
-    if (count == 0) return 0;
-    if (over_string) {
-        write_to_string(out, block, at - 1 - block, ' ');
-    } else {
-        out.write(block, at - 1 - block) << " ";
-    }
+    if (count > 0) write_through_buffer(out, block, static_cast<std::size_t>(at - block));
     return count;
 }
 
-#define KEL_SHOWN(T) template unsigned int show_values(std::ostream&, const T*, unsigned int)
+#define KEL_SHOWN(T) template bool show_value(std::ostream&, T)
+#define KEL_SHOWN_IN_ARRAYS(T) \
+    KEL_SHOWN(T);              \
+    template unsigned int show_values(std::ostream&, const T*, unsigned int)
 KEL_SHOWN(char);
 KEL_SHOWN(unsigned char);
-KEL_SHOWN(short);
-KEL_SHOWN(unsigned short);
-KEL_SHOWN(int);
-KEL_SHOWN(unsigned int);
-KEL_SHOWN(long);
-KEL_SHOWN(unsigned long);
-KEL_SHOWN(long long);
-KEL_SHOWN(unsigned long long);
-KEL_SHOWN(wchar_t);
-KEL_SHOWN(float);
-KEL_SHOWN(double);
+KEL_SHOWN_IN_ARRAYS(short);
+KEL_SHOWN_IN_ARRAYS(unsigned short);
+KEL_SHOWN_IN_ARRAYS(int);
+KEL_SHOWN_IN_ARRAYS(unsigned int);
+KEL_SHOWN_IN_ARRAYS(long);
+KEL_SHOWN_IN_ARRAYS(unsigned long);
+KEL_SHOWN_IN_ARRAYS(long long);
+KEL_SHOWN_IN_ARRAYS(unsigned long long);
+KEL_SHOWN_IN_ARRAYS(wchar_t);
+KEL_SHOWN_IN_ARRAYS(float);
+KEL_SHOWN_IN_ARRAYS(double);
 
 void write_bare(std::ostream& out, unsigned long value) {
     if (!is_plain(out)) {
         out << value;
         return;
     }
-    char text[longest_integer];
+    if (is_over_string(out) && WriteArea::room(out) >= longest_integer) {
+        char* const begin = WriteArea::begin(out);
+        WriteArea::fill(out, static_cast<std::size_t>(show_integer(begin, value) - begin));
+        return;
+    }
+    KEL_UNINITIALIZED char text[longest_integer];
     out.write(text, show_integer(text, value) - text);
 }
 
@@ -117,24 +174,42 @@ bool scan_next(Scan& scan, unsigned char& value) {
     return true;
 }
 
-bool scan_next(Scan& scan, char& c) { return scan.take(c); }
+// A character that nothing follows is left to the ordinary way as well.
+bool scan_next(Scan& scan, char& c) {
+    if (scan.at_end()) return false;
+    c = *scan.at();
+    scan.advance();
+    return !scan.at_end();
+}
 
 }  // namespace
 
 template <class T>
 KEL_FLATTEN unsigned int scan_values(std::istream& in, T* values, unsigned int n) {
     if (!is_plain(in) || !is_over_string(in)) return 0;
-    Scan scan(*in.rdbuf());
+    const char* const begin = ReadArea::begin(in);
+    KEL_UNINITIALIZED Scan scan(begin, ReadArea::end(in));
+    const char* taken = begin;
     unsigned int count = 0;
     for (; count < n; ++count) {
         scan.skip_blanks();
-        if (!scan_next(scan, values[count])) return count;
+        if (!scan_next(scan, values[count])) break;
+        taken = scan.at();
     }
-    if (scan.at_end()) in.setstate(std::ios_base::eofbit);
+    ReadArea::consume(in, taken - begin);
     return count;
 }
 
-#define KEL_SCANNED(T) template unsigned int scan_values(std::istream&, T*, unsigned int)
+template <class T>
+KEL_FLATTEN bool scan_item(std::istream& in, T& value) {
+    if (scan_values(in, &value, 1) == 0) return false;
+    take(in);
+    return true;
+}
+
+#define KEL_SCANNED(T)                                                  \
+    template unsigned int scan_values(std::istream&, T*, unsigned int); \
+    template bool scan_item(std::istream&, T&)
 KEL_SCANNED(char);
 KEL_SCANNED(unsigned char);
 KEL_SCANNED(short);

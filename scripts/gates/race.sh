@@ -5,12 +5,13 @@
 # drown it, which tell the same with and without it.
 threaded='^(core|containers|exceptions|streams|os|services|race|examples|startup)$'
 
-# The thread sanitizer at x86-64. It cannot place its memory in addresses that are more random than
+# The thread sanitizer at x86-64, which would wait a second at the end of each program for reports of threads
+# that go on; there are hundreds of such programs. It cannot place its memory in addresses that are more random than
 # 28 bits. Leaves the figures in $tests.
 under_tsan() {
     local calm=() status=0 stress=build/x86_64-tsan/tests/stress reports
     [ "$(cat /proc/sys/vm/mmap_rnd_bits)" -le 28 ] || calm=(setarch --addr-no-randomize)
-    export TSAN_OPTIONS=second_deadlock_stack=1
+    export TSAN_OPTIONS=second_deadlock_stack=1:atexit_sleep_ms=50
     "${calm[@]}" scripts/test x86_64-tsan -- -L "$threaded" || status=1
     (cd $stress && "${calm[@]}" ./test_stress --gtest_repeat=20 --gtest_shuffle --gtest_brief=1) \
         </dev/null >build/race.tsan.log 2>&1 || status=1

@@ -169,6 +169,21 @@ TEST(PlainWriting, ShowsEveryByteAsCharacterAndAsNumber) {
     });
 }
 
+TEST(PlainWriting, ChangesNothingBehindWhatItOverwrites) {
+    const Dress in_the_middle = [](std::ios& s) {
+        dynamic_cast<std::ostringstream&>(s).str(std::string(100, 'c'));
+        dynamic_cast<std::ostringstream&>(s).seekp(5);
+    };
+    for (int value : integers<int>()) same_writing([&](KELostream& out) { out << value; }, in_the_middle);
+    for (long long value : integers<long long>()) {
+        same_writing([&](KELostream& out) { out << value; }, in_the_middle);
+    }
+    for (double value : decimals()) same_writing([&](KELostream& out) { out << value; }, in_the_middle);
+    for (const char* s : {"", "s", "a longer string", "\x01\""}) {
+        same_writing([&](KELostream& out) { out << 'c' << s; }, in_the_middle);
+    }
+}
+
 TEST(PlainWriting, ShowsTheTextsThatAreKnown) {
     Writer writer;
     writer.out << 0 << -10000 << 99999999u << 10000000000000000000ull << 0.1 << -0.0 << 1e-5 << 123456789.0

@@ -8,6 +8,9 @@
 #include <kel/core/resource.h>
 #include <kel/core/spin_mutex.h>
 #include <kel/core/unique_id.h>
+#include <kel/streams/ostream.h>
+
+#include <sstream>
 
 namespace {
 
@@ -20,6 +23,8 @@ class FirstUse : public testing::Environment {
         counted->_ref();
         counted->_unref();
         counted->_unref();
+        std::stringstream text;
+        KELostream(text) << "long enough for sixteen characters at once";
     }
 };
 

@@ -18,9 +18,10 @@ constexpr int longest_decimal = 16;  // room that show_decimal needs; the longes
 // The text of "%.6g", and its end; null for a number of the ordinary way.
 char* show_decimal(char* at, double value);
 
-// `digits` * 10^`exponent`, rounded to nearest. False, and no value, for a number of the ordinary way.
-bool decimal_value(std::uint64_t digits, int exponent, double& value);
-bool decimal_value(std::uint64_t digits, int exponent, float& value);
+// `digits` * 10^`exponent`, rounded to nearest, or what is as far below 0. False, and no value, for a number
+// of the ordinary way.
+bool decimal_value(bool negative, std::uint64_t digits, int exponent, double& value);
+bool decimal_value(bool negative, std::uint64_t digits, int exponent, float& value);
 
 }  // namespace internal
 }  // namespace kel

@@ -15,12 +15,12 @@
 namespace kel {
 namespace internal {
 
-constexpr int longest_integer = 24;  // the longest text has 20 characters; what follows them is overwritten
+constexpr int longest_integer = 24;  // room that show_integer needs; the longest text has 20 characters
 
 // For copies whose length the compiler knows. The library's calls of memcpy are checked at run time
 // wherever the compiler cannot tell that the room is enough, which takes longer than these copies.
 template <int n>
-void copy_bytes(char* to, const void* from) {
+void copy_bytes(void* to, const void* from) {
     __builtin_memcpy(to, from, n);
 }
 
@@ -46,14 +46,36 @@ inline void put_eight(char* at, std::uint32_t n) {
     put_four(at + 4, n % 10000);
 }
 
-// A number below 10,000 without leading zeros, which are the lowest bytes. Gives the end of its digits,
-// and may write behind it.
+// The digits of a number below 10,000 without leading zeros, the first one lowest, and how many they are.
+struct UpToFour {
+    explicit UpToFour(std::uint32_t n) {
+        const std::uint32_t digits = four_digits(n);
+        const int zeros = __builtin_ctz(digits | 1 << 24) / 8;
+        characters = (digits + four_zeros) >> 8 * zeros;
+        count = 4 - zeros;
+    }
+    std::uint32_t characters;
+    int count;
+};
+
+// The uppermost digits of a larger number. Four characters are written, for others follow.
+inline char* put_uppermost(char* at, std::uint32_t n) {
+    const UpToFour digits(n);
+    copy_bytes<4>(at, &digits.characters);
+    return at + digits.count;
+}
+
+// A number below 10,000: its last two digits lie upon its first two.
 inline char* put_up_to_four(char* at, std::uint32_t n) {
-    const std::uint32_t digits = four_digits(n);
-    const int zeros = __builtin_ctz(digits | 1 << 24) / 8;
-    const std::uint32_t characters = (digits + four_zeros) >> 8 * zeros;
-    copy_bytes<4>(at, &characters);
-    return at + 4 - zeros;
+    const UpToFour digits(n);
+    if (digits.count == 1) {
+        *at = static_cast<char>(digits.characters);
+        return at + 1;
+    }
+    const std::uint32_t last_two = digits.characters >> 8 * (digits.count - 2);
+    copy_bytes<2>(at, &digits.characters);
+    copy_bytes<2>(at + digits.count - 2, &last_two);
+    return at + digits.count;
 }
 
 // The upper half of a product, from the four products of halves: nothing wider is needed at 32 bits.
@@ -71,15 +93,15 @@ inline std::uint64_t without_eight_digits(std::uint64_t n) {
     return high_product(n, 0xabcc77118461cefdu) >> 26;
 }
 
-// Each of these gives the end of the text.
+// Each of these gives the end of the text, and changes nothing behind it.
 inline char* show_integer(char* at, std::uint32_t n) {
     if (n < 10000) return put_up_to_four(at, n);
     if (n < 100000000) {
-        at = put_up_to_four(at, n / 10000);
+        at = put_uppermost(at, n / 10000);
         put_four(at, n % 10000);
         return at + 4;
     }
-    at = put_up_to_four(at, n / 100000000);
+    at = put_uppermost(at, n / 100000000);
     put_eight(at, n % 100000000);
     return at + 8;
 }

@@ -17,10 +17,6 @@
 #include <sstream>
 #include <typeinfo>
 
-// Room that is written before it is read. Cleared first, as the library's build clears everything, it
-// would cost more than the short way spares.
-#define KEL_UNINITIALIZED __attribute__((uninitialized))
-
 namespace kel {
 namespace internal {
 

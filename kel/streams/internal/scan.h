@@ -1,66 +1,49 @@
-// Numbers read off a string buffer character by character, with the digits and signs that programs write.
-// Whatever looks different is left in the buffer as it was found, for the ordinary way.
+// Numbers read off the characters that a string buffer holds, with the digits and signs that programs write.
+// Whatever looks different is left to the ordinary way, and so is a number behind which nothing stands yet:
+// more of it may come.
 //
 // SPDX-License-Identifier: MIT
 #ifndef KEL_STREAMS_INTERNAL_SCAN_H
 #define KEL_STREAMS_INTERNAL_SCAN_H
 
 #include <kel/streams/internal/decimals.h>
+#include <kel/streams/internal/uninitialized.h>
 
 #include <cstdint>
 #include <limits>
-#include <streambuf>
 #include <type_traits>
 
 namespace kel {
 namespace internal {
 
-// A look at the characters of a string buffer, one at a time, that can be undone.
+// A look at some characters, one at a time.
 class Scan {
 public:
-    explicit Scan(std::streambuf& from) : _from(from), _c(from.sgetc()) {}
+    Scan(const char* begin, const char* end) : _at(begin), _end(end) {}
 
-    // White space is gone for good: the ordinary way skips it as well.
+    const char* at() const { return _at; }
+    bool at_end() const { return _at == _end; }
+    bool is(char c) const { return _at != _end && *_at == c; }
+
     void skip_blanks() {
-        _consumed = 0;
-        while (_c == ' ' || (_c >= '\t' && _c <= '\r')) _c = _from.snextc();
+        while (_at != _end && (*_at == ' ' || (*_at >= '\t' && *_at <= '\r'))) ++_at;
     }
 
-    bool at_end() const { return is(std::char_traits<char>::eof()); }
-    bool is(int c) const { return _c == c; }
+    // Goes on to the next character. There is one now.
+    void advance() { ++_at; }
 
-    // Consumes one character, whatever it is, and does not look at the next one.
-    bool take(char& c) {
-        if (at_end()) return false;
-        c = static_cast<char>(_from.sbumpc());
-        return true;
-    }
-
-    // Consumes the character `c` if it comes next.
     bool accept(char c) {
         if (!is(c)) return false;
         advance();
         return true;
     }
 
-    // The value of the digit that comes next; any other character gives 10 or more.
-    unsigned digit() const { return static_cast<unsigned>(_c) - '0'; }
-
-    void advance() {
-        _c = _from.snextc();
-        ++_consumed;
-    }
-
-    // Puts back what was consumed behind the blanks. Gives false, for the caller to hand on.
-    bool undo() {
-        for (; _consumed > 0; --_consumed) _from.sungetc();
-        return false;
-    }
+    // The value of the digit that comes next; any other character, and none, gives 10 or more.
+    unsigned digit() const { return _at != _end ? static_cast<unsigned>(*_at) - '0' : 10; }
 
 private:
-    std::streambuf& _from;
-    int _c;
-    int _consumed = 0;
+    const char* _at;
+    const char* const _end;
 };
 
 // Digits whose number fits into 32 bits whatever they are.
@@ -81,7 +64,7 @@ struct FewDigits {
 // As many digits as 64 bits hold whatever they are; `whole` tells that no more follow.
 struct Digits {
     explicit Digits(Scan& scan) {
-        const FewDigits first(scan);
+        KEL_UNINITIALIZED const FewDigits first(scan);
         number = first.number;
         count = first.count;
         if (count == FewDigits::most) add(scan);
@@ -92,7 +75,7 @@ struct Digits {
     void add(Scan& scan) {
         static constexpr std::uint32_t powers[] = {1,      10,      100,      1000,      10000,
                                                    100000, 1000000, 10000000, 100000000, 1000000000};
-        const FewDigits more(scan);
+        KEL_UNINITIALIZED const FewDigits more(scan);
         number = number * powers[more.count] + more.number;
         count += more.count;
     }
@@ -110,20 +93,21 @@ std::uint64_t largest(bool negative) {
     return std::is_signed_v<T> ? positive + 1 : 0;
 }
 
+// Each gives the value, or false for a number of the ordinary way. The scan has then gone anywhere.
 template <class T>
 std::enable_if_t<std::is_integral_v<T>, bool> scan_number(Scan& scan, T& value) {
     const bool negative = std::is_signed_v<T> && scan.accept('-');
-    Digits digits(scan);
+    KEL_UNINITIALIZED Digits digits(scan);
     if (!digits.whole) {
         // The nineteenth digit and the twentieth, which fits only at times.
         std::uint64_t number = digits.number;
         for (; scan.digit() < 10; scan.advance()) {
-            if (__builtin_mul_overflow(number, 10u, &number)) return scan.undo();
-            if (__builtin_add_overflow(number, scan.digit(), &number)) return scan.undo();
+            if (__builtin_mul_overflow(number, 10u, &number)) return false;
+            if (__builtin_add_overflow(number, scan.digit(), &number)) return false;
         }
         digits.number = number;
     }
-    if (digits.count == 0 || digits.number > largest<T>(negative)) return scan.undo();
+    if (scan.at_end() || digits.count == 0 || digits.number > largest<T>(negative)) return false;
     value = static_cast<T>(negative ? 0 - digits.number : digits.number);
     return true;
 }
@@ -131,28 +115,25 @@ std::enable_if_t<std::is_integral_v<T>, bool> scan_number(Scan& scan, T& value) 
 template <class T>
 std::enable_if_t<std::is_floating_point_v<T>, bool> scan_number(Scan& scan, T& value) {
     const bool negative = scan.accept('-');
-    Digits digits(scan);
+    KEL_UNINITIALIZED Digits digits(scan);
     int exponent = 0;
-    if (digits.count == 0) return scan.undo();
+    if (digits.count == 0) return false;
     if (scan.accept('.')) {
         const int before = digits.count;
-        if (before > FewDigits::most) return scan.undo();
+        if (before > FewDigits::most) return false;
         digits.add(scan);
-        if (digits.count == before) return scan.undo();
+        if (digits.count == before) return false;
         exponent = before - digits.count;
     }
-    if (scan.digit() < 10 || scan.is('E')) return scan.undo();
+    if (scan.digit() < 10 || scan.is('E')) return false;
     if (scan.accept('e')) {
         const bool down = scan.accept('-');
         if (!down) scan.accept('+');
-        const FewDigits power(scan);
-        if (power.count == 0 || power.count > 3) return scan.undo();
+        KEL_UNINITIALIZED const FewDigits power(scan);
+        if (power.count == 0 || power.count > 3) return false;
         exponent += static_cast<int>(down ? 0 - power.number : power.number);
     }
-    T result;
-    if (!decimal_value(digits.number, exponent, result)) return scan.undo();
-    value = negative ? -result : result;
-    return true;
+    return !scan.at_end() && decimal_value(negative, digits.number, exponent, value);
 }
 
 }  // namespace internal
