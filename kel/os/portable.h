@@ -24,7 +24,8 @@
 
 // The version of the operating system.
 struct KEL_API KELSysVersion {
-    // Both stay 0 for a release that begins with a digit, as those of Linux do.
+    // Anything when it could not be read, as both for a release that begins with a digit, like those
+    // of Linux.
     std::uint16_t major;
     std::uint16_t minor;
 };

@@ -136,6 +136,17 @@ char read_escape(std::istream& in, std::uint32_t& offset) {
 // Whether a character inside the quotes will be stored, by itself or with its escape.
 bool takes_room(int c) { return c != '"' && c != '\n' && c != end_of_input; }
 
+// Reads a quoted string into a new one. What a stream throws leaves that empty: nobody could tell what has
+// been stored from what its memory held before.
+void read_into(KEListream& in, char* s, std::uint32_t length) {
+    try {
+        in.getCString(s, length);
+    } catch (...) {
+        s[0] = '\0';
+        throw;
+    }
+}
+
 // The form of std::cin: one word into the caller's own buffer. There is nothing to allocate and no
 // way to know the room, so a missing buffer fails the stream.
 void read_word(std::istream& in, char* s, std::uint32_t& offset) {
@@ -169,7 +180,7 @@ KEListream& KEListream::operator>>(char*& s) {
     if (length == 1) {
         if (in.peek() == '"') {
             s = new_string(2);  // the quotes are trusted for no more than the two bytes of this room
-            getCString(s, 2);
+            read_into(*this, s, 2);
         } else {
             in.get();
             s = new_string(0);
@@ -177,7 +188,7 @@ KEListream& KEListream::operator>>(char*& s) {
         return *this;
     }
     s = new_string(length);
-    getCString(s, length);
+    read_into(*this, s, length);
     // Deliberate: a newline here is taken even when the string had room for its terminator and the
     // newline is the next item's. Pinned by StringReading.ANewlineBehindTheStringIsTaken.
     if (in.peek() == '\n') {

@@ -77,6 +77,7 @@ public:
             write(text, n);
             return;
         }
+        if (n == 0) return;  // and perhaps no room at all
         std::memcpy(_at, text, n);
         _at += n;
     }

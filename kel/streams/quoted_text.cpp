@@ -61,6 +61,7 @@ private:
     void copy_run() {
         const std::size_t most = std::min<std::size_t>(static_cast<std::size_t>(_end - _at), _to.room);
         const std::uint32_t n = static_cast<std::uint32_t>(quoted_run(_at, most));
+        if (n == 0) return;  // and perhaps no buffer
         std::memcpy(_to.buf, _at, n);
         advance(n, n, n);
     }

@@ -164,10 +164,17 @@ TEST_F(SystemVersion, IsNullWithAMessageWhenTheSystemFails) {
     EXPECT_EQ(outcome.err, "Could not obtain OS version information\n");
 }
 
+// What a field holds that is not written.
+int fresh() {
+    int field;
+    std::memset(&field, AllocationPlan::fresh_byte, sizeof field);
+    return field;
+}
+
 TEST_F(SystemVersion, AReleaseThatBeginsWithADigitFillsNothing) {
-    expect_version("2.6.32-5-686", 0, 0);
-    expect_version("6.1.0", 0, 0);
-    expect_version("10.20.30", 0, 0);
+    expect_version("2.6.32-5-686", fresh(), fresh());
+    expect_version("6.1.0", fresh(), fresh());
+    expect_version("10.20.30", fresh(), fresh());
 }
 
 TEST_F(SystemVersion, AReleaseWithFewerThanTwoDotsGivesAnEmptyRecord) {
@@ -185,8 +192,8 @@ TEST_F(SystemVersion, IsReadFromTheDigitsBeforeTheLastDotButOne) {
 }
 
 TEST_F(SystemVersion, StopsAtACharacterThatIsNotGreaterThanTheFirst) {
-    expect_version("v6.1.0", 0, 0);
-    expect_version("..1.0", 0, 0);
+    expect_version("v6.1.0", fresh(), fresh());
+    expect_version("..1.0", fresh(), fresh());
 }
 
 TEST_F(SystemVersion, ComparesTheCharactersAsSignedBytes) {
@@ -196,7 +203,9 @@ TEST_F(SystemVersion, ComparesTheCharactersAsSignedBytes) {
         5, 4);
 }
 
-TEST_F(SystemVersion, LeavesTheMinorPartAloneWhenOnlyTheMajorOneCanBeRead) { expect_version(" 7..x", 7, 0); }
+TEST_F(SystemVersion, LeavesTheMinorPartAloneWhenOnlyTheMajorOneCanBeRead) {
+    expect_version(" 7..x", 7, fresh());
+}
 
 TEST_F(SystemVersion, IsNullWithoutMemoryAndThrowsNothing) {
     AllocationPlan::fail(1);

@@ -107,6 +107,17 @@ TEST(StringReading, AStringThatFillsItsLengthIsTerminatedWithoutANewline) {
     CORBA::string_free(s);
 }
 
+TEST(StringReading, AStreamThatThrowsLeavesAnEmptyString) {
+    for (const char* input : {"20 \"cut off ", "1\"c"}) {
+        Reader r(input);
+        r.text.exceptions(std::ios::failbit | std::ios::eofbit);
+        char* s = nullptr;
+        EXPECT_THROW(r.in >> s, std::ios_base::failure);
+        EXPECT_STREQ(s, "");
+        CORBA::string_free(s);
+    }
+}
+
 TEST(StringReading, AStringLongerThanItsLengthIsCutAndReported) {
     StringRead read("3\"abcde\"\n");
     EXPECT_STREQ(read.s, "abc");

@@ -251,6 +251,9 @@ struct AllocationPlan {
     static void fail(long nth, bool from_then_on = false);
     static long calls();        // armed calls since the last reset
     static long live_blocks();  // blocks of operator new that are in use in the whole process
+
+    // What a new block holds, as far as its first 4 KiB: nothing that one could mistake for cleared memory.
+    static constexpr unsigned char fresh_byte = 0xa5;
 };
 
 // A fixture that starts and ends with no plan.

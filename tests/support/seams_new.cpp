@@ -2,8 +2,10 @@
 // In a file of its own because a sanitizer that defines these operators itself must leave it out.
 //
 // SPDX-License-Identifier: MIT
+#include <algorithm>
 #include <atomic>
 #include <cstdlib>
+#include <cstring>
 #include <new>
 
 #include "tests/support/fault.h"
@@ -28,8 +30,9 @@ bool allocation_fails() {
 void* allocate(std::size_t n) {
     if (allocation_fails()) return nullptr;
     void* block = std::malloc(n == 0 ? 1 : n);
-    if (block != nullptr) ++live;
-    return block;
+    if (block == nullptr) return nullptr;
+    ++live;
+    return std::memset(block, AllocationPlan::fresh_byte, std::min<std::size_t>(n, 4096));
 }
 
 void* allocate_or_throw(std::size_t n) {

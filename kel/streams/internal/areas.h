@@ -15,10 +15,13 @@
 #include <cstddef>
 #include <cstring>
 #include <istream>
+#include <limits>
 #include <streambuf>
 
 namespace kel {
 namespace internal {
+
+constexpr int largest_step = std::numeric_limits<int>::max();  // of a buffer's pointers
 
 // Both hold for a stream with a buffer, until the next call of any other function that reads or writes.
 
@@ -27,6 +30,7 @@ public:
     static const char* begin(const std::ios& stream) { return (stream.rdbuf()->*&ReadArea::gptr)(); }
     static const char* end(const std::ios& stream) { return (stream.rdbuf()->*&ReadArea::egptr)(); }
     static void consume(std::ios& stream, std::ptrdiff_t n) {
+        for (; n > largest_step; n -= largest_step) (stream.rdbuf()->*&ReadArea::gbump)(largest_step);
         (stream.rdbuf()->*&ReadArea::gbump)(static_cast<int>(n));
     }
 };
@@ -39,6 +43,7 @@ public:
         return static_cast<std::size_t>(end(stream) - begin(stream));
     }
     static void fill(std::ios& stream, std::size_t n) {
+        for (; n > largest_step; n -= largest_step) (stream.rdbuf()->*&WriteArea::pbump)(largest_step);
         (stream.rdbuf()->*&WriteArea::pbump)(static_cast<int>(n));
     }
 };

@@ -183,7 +183,7 @@ void use_time() {
 void use_system() {
     KELSysVersion version = {};
     say("version", KELPortable::get_sysversion(version));
-    std::cout << version.major << "." << version.minor << " " << BaseUtil::user_name() << "\n";
+    std::cout << BaseUtil::user_name() << "\n";
     char found[1024];
     say("whence", KELPortable::vwhence("sh", found));
     say("at", found);

@@ -94,7 +94,7 @@ class LastDescriptor : public Scenario {
 KEL_SCENARIO(LastDescriptor).giving("1");
 
 int answer_uname(utsname* system) {
-    std::strcpy(system->release, "v3.14.15");
+    std::strcpy(system->release, " 3.14.15");
     return 0;
 }
 
