@@ -103,6 +103,7 @@ private:
 
     void write(const char* text, std::size_t n) {
         WriteArea::fill(_out, filled());
+        _begin = _at;
         _out.write(text, static_cast<std::streamsize>(n));
         look();
     }

@@ -13,7 +13,6 @@
 #define KEL_STREAMS_INTERNAL_AREAS_H
 
 #include <cstddef>
-#include <cstring>
 #include <istream>
 #include <limits>
 #include <streambuf>
@@ -27,31 +26,31 @@ constexpr int largest_step = std::numeric_limits<int>::max();  // of a buffer's 
 
 class ReadArea : std::streambuf {
 public:
-    static const char* begin(const std::ios& stream) { return (stream.rdbuf()->*&ReadArea::gptr)(); }
-    static const char* end(const std::ios& stream) { return (stream.rdbuf()->*&ReadArea::egptr)(); }
+    static const char* begin(const std::ios& stream) { return (stream.rdbuf()->*(&ReadArea::gptr))(); }
+    static const char* end(const std::ios& stream) { return (stream.rdbuf()->*(&ReadArea::egptr))(); }
     static void consume(std::ios& stream, std::ptrdiff_t n) {
-        for (; n > largest_step; n -= largest_step) (stream.rdbuf()->*&ReadArea::gbump)(largest_step);
-        (stream.rdbuf()->*&ReadArea::gbump)(static_cast<int>(n));
+        for (; n > largest_step; n -= largest_step) (stream.rdbuf()->*(&ReadArea::gbump))(largest_step);
+        (stream.rdbuf()->*(&ReadArea::gbump))(static_cast<int>(n));
     }
 };
 
 class WriteArea : std::streambuf {
 public:
-    static char* begin(const std::ios& stream) { return (stream.rdbuf()->*&WriteArea::pptr)(); }
-    static char* end(const std::ios& stream) { return (stream.rdbuf()->*&WriteArea::epptr)(); }
+    static char* begin(const std::ios& stream) { return (stream.rdbuf()->*(&WriteArea::pptr))(); }
+    static char* end(const std::ios& stream) { return (stream.rdbuf()->*(&WriteArea::epptr))(); }
     static std::size_t room(const std::ios& stream) {
         return static_cast<std::size_t>(end(stream) - begin(stream));
     }
     static void fill(std::ios& stream, std::size_t n) {
-        for (; n > largest_step; n -= largest_step) (stream.rdbuf()->*&WriteArea::pbump)(largest_step);
-        (stream.rdbuf()->*&WriteArea::pbump)(static_cast<int>(n));
+        for (; n > largest_step; n -= largest_step) (stream.rdbuf()->*(&WriteArea::pbump))(largest_step);
+        (stream.rdbuf()->*(&WriteArea::pbump))(static_cast<int>(n));
     }
 };
 
 // The count of characters that the last unformatted input took.
 class InputCount : std::istream {
 public:
-    static void set(std::istream& in, std::streamsize n) { in.*& InputCount::_M_gcount = n; }
+    static void set(std::istream& in, std::streamsize n) { in.*(&InputCount::_M_gcount) = n; }
 };
 
 // Consumes the next character as in.get() does. For a stream over a string that throws nothing.
