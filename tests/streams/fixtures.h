@@ -1,6 +1,8 @@
 // What the stream tests share.
 //
 //   Writer, Reader   a stream over a string
+//   alike            a locale that shows and reads like the classic one, but is another, so that the standard
+//                    library does all the work
 //   Swapped          puts a string buffer under a standard stream until the end of the scope
 //   TestTable        an indirection table that tells when it dies
 //
@@ -12,8 +14,11 @@
 #include <kel/streams/offset_table.h>
 #include <kel/streams/ostream.h>
 
+#include <locale>
 #include <sstream>
 #include <string>
+
+inline std::locale alike() { return std::locale(std::locale::classic(), new std::numpunct<char>); }
 
 struct Writer {
     Writer() : out(text) {}

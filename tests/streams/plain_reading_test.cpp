@@ -25,9 +25,9 @@ std::string bytes(const T& value) {
     return words.str();
 }
 
-// One value, another one, and five as an array.
+// One value, and another one.
 template <class T>
-void read_as(const std::string& input, const Dress& dress = undressed) {
+void read_one_and_two(const std::string& input, const Dress& dress) {
     same_reading(
         [](KEListream& in) {
             T value = static_cast<T>(42);
@@ -44,16 +44,25 @@ void read_as(const std::string& input, const Dress& dress = undressed) {
         input, dress);
 }
 
+// Once at the end of the input, where more digits might have come, and once with a separator behind.
+template <class T>
+void read_as(const std::string& input, const Dress& dress = undressed) {
+    read_one_and_two<T>(input, dress);
+    read_one_and_two<T>(input + ' ', dress);
+}
+
 template <class T>
 void read_array_as(const std::string& input, const Dress& dress = undressed) {
-    for (unsigned int n : {0u, 1u, 3u, 5u}) {
-        same_reading(
-            [n](KEListream& in) {
-                T values[5] = {T(1), T(2), T(3), T(4), T(5)};
-                in.get(values, n);
-                return bytes(values);
-            },
-            input, dress);
+    for (const std::string& text : {input, input + ' '}) {
+        for (unsigned int n : {0u, 1u, 3u, 5u}) {
+            same_reading(
+                [n](KEListream& in) {
+                    T values[5] = {T(1), T(2), T(3), T(4), T(5)};
+                    in.get(values, n);
+                    return bytes(values);
+                },
+                text, dress);
+        }
     }
 }
 

@@ -42,9 +42,11 @@ TEST(QuotedReading, WhiteSpaceBeforeTheQuoteIsSkippedAndNotCounted) {
 }
 
 TEST(QuotedReading, RawNewlinesAreSkippedButCounted) {
-    BufferRead read("\"a\n\nb\"\n", 3);
-    EXPECT_STREQ(read.buffer.c_str(), "ab");
-    EXPECT_EQ(read.offset(), 1u + 4 + 1);
+    for (const std::locale& locale : {std::locale::classic(), alike()}) {
+        BufferRead read("\"a\n\nb\"\n", 3, locale);
+        EXPECT_STREQ(read.buffer.c_str(), "ab");
+        EXPECT_EQ(read.offset(), 1u + 4 + 1);
+    }
 }
 
 TEST(QuotedReading, RawNewlinesNeedNoRoom) {

@@ -76,8 +76,10 @@ TEST(StringEscapes, HexadecimalCountsFiveOnReading) {
     Writer w;
     w.out.putCString("\1");
     EXPECT_EQ(w.out.cur_out_offset(), 1u + 4 + 2);
-    const BufferRead read(w.written(), 2);
-    EXPECT_EQ(read.offset(), 1u + 5 + 1);
+    for (const std::locale& locale : {std::locale::classic(), alike()}) {
+        const BufferRead read(w.written(), 2, locale);
+        EXPECT_EQ(read.offset(), 1u + 5 + 1);
+    }
 }
 
 // One byte as it stands in a quoted string.

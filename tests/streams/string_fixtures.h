@@ -40,7 +40,10 @@ struct StringRead {
 
 // Reads one quoted string into a buffer of `room` bytes, filled with '#' and guarded behind.
 struct BufferRead {
-    BufferRead(const std::string& input, unsigned int room) : reader(input), buffer(room + 8, '#') {
+    BufferRead(const std::string& input, unsigned int room,
+               const std::locale& locale = std::locale::classic())
+        : reader(input), buffer(room + 8, '#') {
+        reader.text.imbue(locale);
         Swapped errors(std::cerr);
         result = &reader.in.getCString(&buffer[0], room);
         messages = errors.text();

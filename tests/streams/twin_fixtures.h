@@ -1,7 +1,6 @@
 // Two streams over the same text: one is plain, the other has a locale that looks the same and is another,
 // so that the standard library does all the work. Whatever happens to the one has to happen to the other.
 //
-//   alike           a locale that shows and reads like the classic one
 //   seen            all that can be told of a standard stream, in words
 //   same_writing    does a work on two output streams and compares what became of them
 //   same_reading    the same for two input streams
@@ -21,8 +20,6 @@
 #include <string>
 
 #include "tests/streams/fixtures.h"
-
-inline std::locale alike() { return std::locale(std::locale::classic(), new std::numpunct<char>); }
 
 inline std::string seen(const std::ios& stream) {
     std::ostringstream words;
