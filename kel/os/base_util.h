@@ -26,11 +26,12 @@ struct KEL_API vhostname {
 
 class KEL_API BaseUtil {
 public:
-    // The version of the running system, as far as it could be read. Deliberate: a field that could not is
-    // not written and holds anything, as both do for a release that begins with a digit, like those of Linux.
-    // Pinned by SystemVersion.AReleaseThatBeginsWithADigitFillsNothing. Both are 0 for a release with fewer
-    // than two dots.
+    // The version of the running system, as far as it could be read. Both parts are 0 for a release with
+    // fewer than two dots.
     struct SysVersion {
+        // Deliberate: a part that could not be read is not written and holds anything, as both do for a
+        // release that begins with a digit, like those of Linux. Pinned by
+        // SystemVersion.AReleaseThatBeginsWithADigitFillsNothing.
         int major;
         int minor;
     };
