@@ -25,7 +25,9 @@ namespace internal {
 // standard library's _M_getloc spares the copy that getloc() counts.
 inline bool has_classic_locale(const std::ios_base& stream) {
     static const std::locale& classic = std::locale::classic();
-    return std::memcmp(&stream._M_getloc(), &classic, sizeof(std::locale)) == 0;
+    const void* const held = &stream._M_getloc();
+    const void* const wanted = &classic;
+    return std::memcmp(held, wanted, sizeof(std::locale)) == 0;
 }
 
 // Has no tied stream to flush, no flush of its own after each piece (a flag), and throws nothing.
