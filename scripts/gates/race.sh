@@ -5,9 +5,9 @@
 # drown it, which tell the same with and without it.
 threaded='^(core|containers|exceptions|streams|os|services|race|examples|startup)$'
 
-# The thread sanitizer at x86-64, which would wait a second at the end of each program for reports of threads
-# that go on; there are hundreds of such programs. It cannot place its memory in addresses that are more random than
-# 28 bits. Leaves the figures in $tests.
+# The thread sanitizer at x86-64, which would wait a second at the end of each program for reports of
+# threads that go on; there are hundreds of such programs. It cannot place its memory in addresses that
+# are more random than 28 bits. Leaves the figures in $tests.
 under_tsan() {
     local calm=() status=0 stress=build/x86_64-tsan/tests/stress reports
     [ "$(cat /proc/sys/vm/mmap_rnd_bits)" -le 28 ] || calm=(setarch --addr-no-randomize)

@@ -3,6 +3,7 @@
 
 #include <kel/containers/strings.h>
 
+#include <cfenv>
 #include <cmath>
 #include <cstdio>
 #include <cstring>
@@ -278,6 +279,14 @@ TEST(PlainReading, TakesDecimalsThatLieBetweenTwoNumbers) {
         char text[64];
         std::snprintf(text, sizeof text, "%.10g", (static_cast<double>(single) + 0.03125 * (i % 32)) / 16);
         read_as_decimals(text);
+    }
+}
+
+TEST(PlainReading, RoundsAsTheThreadIsTold) {
+    for (int direction : {FE_DOWNWARD, FE_UPWARD, FE_TOWARDZERO}) {
+        std::fesetround(direction);
+        for (const char* text : {"0.1", "-0.1", "0.7", "123.456", "-9.99e-5"}) read_as_decimals(text);
+        std::fesetround(FE_TONEAREST);
     }
 }
 

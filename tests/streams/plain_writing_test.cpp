@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: MIT
 // Plain streams are written to without the standard library's formatting. Nobody can tell.
 
+#include <cfenv>
 #include <clocale>
 #include <cmath>
 #include <cstring>
@@ -150,6 +151,16 @@ TEST(PlainWriting, ShowsUnsignedIntegersOfEveryLength) {
 
 TEST(PlainWriting, ShowsDoublesOfEverySignAndExponent) { each_alone_and_all(doubles()); }
 TEST(PlainWriting, ShowsShortDecimalsAndTheirNeighbours) { each_alone_and_all(decimals()); }
+
+TEST(PlainWriting, RoundsAsTheThreadIsTold) {
+    for (int direction : {FE_DOWNWARD, FE_UPWARD, FE_TOWARDZERO}) {
+        std::fesetround(direction);
+        for (double value : {0.12345678, -0.12345678, 999999.9, 2e-5 / 3, -1e20 / 3}) {
+            same_writing([&](KELostream& out) { out << value; });
+        }
+        std::fesetround(FE_TONEAREST);
+    }
+}
 
 TEST(PlainWriting, ShowsFloats) {
     std::mt19937 draw(4);
