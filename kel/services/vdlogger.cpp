@@ -1,4 +1,5 @@
 // SPDX-License-Identifier: MIT
+#include <kel/core/internal/attributes.h>
 #include <kel/core/internal/failure.h>
 #include <kel/services/debug_logger.h>
 #include <kel/streams/internal/digits.h>
@@ -43,7 +44,8 @@ int checked_group(unsigned int module, unsigned line, const char* function) {
 
 // ---- the text of a time ----
 
-const std::size_t time_room = 26;  // for ctime_r
+const std::size_t time_room = 26;    // for ctime_r
+const std::size_t time_length = 24;  // of its text without the newline
 const std::size_t longest_zone = 63;
 const char no_zone[] = "\n";  // stands for a TZ that is not set, which is another zone than an empty one
 
@@ -57,11 +59,11 @@ struct TimeText {
 TimeText last_time;
 bool last_time_taken;  // by a thread; others do without it, and so does a child whose parent's thread had it
 
-// The first 24 characters that ctime has for `now`, or none.
+// What ctime has for `now` without its newline, or nothing.
 void make_time_text(std::time_t now, char (&text)[time_room]) {
     tzset();  // ctime_r, unlike ctime, need not look at a changed TZ
     if (ctime_r(&now, text) == nullptr) text[0] = '\0';
-    text[24] = '\0';
+    text[time_length] = '\0';
 }
 
 void local_time_text(std::time_t now, char (&text)[time_room]) {
@@ -235,16 +237,17 @@ bool KELDebugLogger::prints(unsigned int module, int group) const {
 // longer than the system takes to write it.
 void KELDebugLogger::print_header(unsigned int level, unsigned int module, const char* file, int line) {
     const std::time_t now = std::time(nullptr);
-    char text[time_room];
+    KEL_UNINITIALIZED char text[time_room];
     local_time_text(now, text);
     if (file == nullptr || std::strlen(file) > longest_short_name) {
         std::fprintf(_fp, "=> %s,%02x,%08x,%s,%d,%d\n", text, level, module, file, line,
                      static_cast<int>(now));
         return;
     }
-    char header[longest_short_name + 100];
+    KEL_UNINITIALIZED char header[longest_short_name + 100];
     char* at = put_text(header, "=> ");
-    at = put_text(at, text);
+    std::memcpy(at, text, time_room);
+    if (text[0] != '\0') at += time_length;
     *at++ = ',';
     at = put_hexadecimal(at, level, 2);
     *at++ = ',';
@@ -268,7 +271,7 @@ KELDebugLogger& KELDebugLogger::operator<<(const char* s) {
 
 KELDebugLogger& KELDebugLogger::operator<<(long n) {
     if (_in_line != 0 && _fp != nullptr) {
-        char text[longest_integer + 1];
+        KEL_UNINITIALIZED char text[longest_integer + 1];
         *show_integer(text, n) = '\0';
         std::fputs(text, _fp);
     }

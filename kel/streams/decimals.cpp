@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: MIT
+#include <kel/core/internal/attributes.h>
 #include <kel/streams/internal/decimals.h>
 #include <kel/streams/internal/digits.h>
-#include <kel/streams/internal/uninitialized.h>
 
 #include <cfenv>
 #include <cstring>

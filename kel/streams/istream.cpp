@@ -1,13 +1,15 @@
 // SPDX-License-Identifier: MIT
 #include <kel/core/internal/failure.h>
 #include <kel/streams/internal/console.h>
+#include <kel/streams/internal/short_way.h>
 #include <kel/streams/internal/table_list.h>
 #include <kel/streams/internal/text.h>
 #include <kel/streams/istream.h>
 
 #include <iostream>
 
-using kel::internal::read_item;
+using kel::internal::extract_value;
+using kel::internal::scan_in_memory;
 using kel::internal::TableList;
 using kel::internal::text;
 
@@ -70,10 +72,18 @@ int KEListream::_type_number() { return 0; }
 
 namespace {
 
+// The ordinary way of a value and the character behind it, kept out of the short one.
+template <class T>
+[[gnu::noinline]] void read_item(std::istream& in, T& value) {
+    extract_value(in, value);
+    in.get();
+}
+
 // Reads one value and the separator behind it. `size` is what the value itself counts.
 template <class T>
-KEListream& extract(KEListream& in, T& value, std::uint32_t size) {
-    read_item(text(in._strm), value);
+KEL_FLATTEN KEListream& extract(KEListream& in, T& value, std::uint32_t size) {
+    std::istream& stream = text(in._strm);
+    if (!scan_in_memory<1>(stream, value)) read_item(stream, value);
     in._offset += size + 1;
     return in;
 }

@@ -5,6 +5,7 @@
 #include <kel/streams/internal/escapes.h>
 #include <kel/streams/internal/plain.h>
 #include <kel/streams/internal/quoted_text.h>
+#include <kel/streams/internal/short_way.h>
 #include <kel/streams/internal/text.h>
 #include <kel/streams/istream.h>
 
@@ -24,7 +25,6 @@ using kel::internal::QuotedTarget;
 using kel::internal::read_quoted_text;
 using kel::internal::read_value;
 using kel::internal::ReadArea;
-using kel::internal::take;
 using kel::internal::text;
 
 namespace {
@@ -49,6 +49,20 @@ wchar_t* new_wide_array(std::uint32_t n) {
     if (n >= largest_array / sizeof(wchar_t)) throw std::bad_alloc();
     return new wchar_t[n + 1]();
 }
+
+// The characters of a stream one by one, in the shortest way that it has.
+class Characters {
+public:
+    explicit Characters(std::istream& in) : _in(in), _in_memory(is_plain(in) && is_over_string(in)) {}
+
+    bool in_memory() const { return _in_memory; }
+    int peek() { return _in_memory ? kel::internal::peek(_in) : _in.peek(); }
+    int take() { return _in_memory ? kel::internal::take(_in) : _in.get(); }
+
+private:
+    std::istream& _in;
+    const bool _in_memory;
+};
 
 // Consumes the opening quote if it comes next, as it does where the writer has been.
 bool take_quote(std::istream& in) {
@@ -187,12 +201,13 @@ KEListream& KEListream::operator>>(char*& s) {
         }
         return *this;
     }
+    Characters characters(in);
     s = new_string(length);
     read_into(*this, s, length);
     // Deliberate: a newline here is taken even when the string had room for its terminator and the
     // newline is the next item's. Pinned by StringReading.ANewlineBehindTheStringIsTaken.
-    if (in.peek() == '\n') {
-        in.get();
+    if (characters.peek() == '\n') {
+        characters.take();
         s[length] = '\0';
     }
     return *this;
@@ -200,20 +215,20 @@ KEListream& KEListream::operator>>(char*& s) {
 
 KEListream& KEListream::getCString(char* buf, unsigned int len) {
     std::istream& in = text(_strm);
-    const bool in_memory = is_plain(in) && is_over_string(in);
-    const bool quoted = (in_memory && take_quote(in)) || read_opening_quote(in);
+    Characters characters(in);
+    const bool quoted = (characters.in_memory() && take_quote(in)) || read_opening_quote(in);
     _offset += 1;
     if (!quoted) return *this;
 
     QuotedTarget to = {buf, len, _offset};
     for (;;) {
-        if (in_memory && in.good()) read_quoted_text(in, to);
-        if (to.room == 0 && takes_room(in.peek())) {  // and stays unread
+        if (characters.in_memory() && in.good()) read_quoted_text(in, to);
+        if (to.room == 0 && takes_room(characters.peek())) {  // and stays unread
             _offset += 1;
             report_overflow();
             return *this;
         }
-        const int c = in_memory ? take(in) : in.get();
+        const int c = characters.take();
         if (c == '"') {
             if (to.room == 0) return *this;
             break;
@@ -231,7 +246,7 @@ KEListream& KEListream::getCString(char* buf, unsigned int len) {
         *to.buf++ = c == '\\' ? read_escape(in, _offset) : static_cast<char>(c);
     }
     *to.buf = '\0';
-    in_memory ? take(in) : in.get();
+    characters.take();
     _offset += 1;
     return *this;
 }

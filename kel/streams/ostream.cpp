@@ -1,8 +1,10 @@
 // SPDX-License-Identifier: MIT
+#include <kel/streams/internal/short_way.h>
 #include <kel/streams/internal/table_list.h>
 #include <kel/streams/internal/text.h>
 #include <kel/streams/ostream.h>
 
+using kel::internal::show_in_memory;
 using kel::internal::TableList;
 using kel::internal::text;
 using kel::internal::write_value;
@@ -52,8 +54,9 @@ namespace {
 
 // Writes one value and its separator. `size` is what the value itself counts.
 template <class T>
-KELostream& insert(KELostream& out, T value, std::uint32_t size) {
-    write_value(text(out._strm), value);
+KEL_FLATTEN KELostream& insert(KELostream& out, T value, std::uint32_t size) {
+    std::ostream& stream = text(out._strm);
+    if (!show_in_memory(stream, value)) write_value(stream, value);
     out._offset += size + 1;
     return out;
 }

@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: MIT
+#include <kel/core/internal/attributes.h>
 #include <kel/streams/internal/areas.h>
 #include <kel/streams/internal/console.h>
 #include <kel/streams/internal/escapes.h>
 #include <kel/streams/internal/plain.h>
 #include <kel/streams/internal/runs.h>
 #include <kel/streams/internal/text.h>
-#include <kel/streams/internal/uninitialized.h>
 #include <kel/streams/ostream.h>
 
 #include <cctype>

@@ -1,25 +1,27 @@
 // SPDX-License-Identifier: MIT
+#include <kel/core/internal/attributes.h>
 #include <kel/streams/internal/areas.h>
 #include <kel/streams/internal/decimals.h>
 #include <kel/streams/internal/digits.h>
 #include <kel/streams/internal/plain.h>
 #include <kel/streams/internal/scan.h>
+#include <kel/streams/internal/short_way.h>
 #include <kel/streams/internal/text.h>
-#include <kel/streams/internal/uninitialized.h>
 
 namespace kel {
 namespace internal {
 
-// One function of a value's way from the check to the buffer, without calls to the next step: a call of
-// position-independent 32-bit code takes as long as two digits.
-#define KEL_FLATTEN __attribute__((flatten))
+const void* known_classic;
+
+bool learn_classic(const std::ios_base& stream) {
+    const void* const classic = held_by(std::locale::classic());
+    __atomic_store_n(&known_classic, classic, __ATOMIC_RELAXED);
+    return held_by(stream._M_getloc()) == classic;
+}
 
 // ---- writing ----
 
 namespace {
-
-constexpr std::size_t longest_value = longest_integer;
-static_assert(longest_decimal <= longest_value, "both kinds of numbers have room");
 
 // Each gives the end of the text without its separator; null when only the inserter knows it.
 template <class T>
@@ -96,36 +98,56 @@ bool show_as_one_piece(std::ostream& out, T value) {
 }  // namespace
 
 template <class T>
-KEL_FLATTEN bool show_value(std::ostream& out, T value) {
-    if (!is_plain(out)) return false;
-    if (!is_over_string(out)) return !std::is_same_v<T, char> && show_as_one_piece(out, value);
-    if (std::is_floating_point_v<T> || WriteArea::room(out) <= longest_value)
-        return show_and_copy(out, value);
-    char* const begin = WriteArea::begin(out);
-    char* const end = show(out, begin, shown(value));
-    *end = ' ';
-    WriteArea::fill(out, static_cast<std::size_t>(end + 1 - begin));
-    return true;
+void write_value(std::ostream& out, T value) {
+    if (is_plain(out)) {
+        if (is_over_string(out)) {
+            if (show_and_copy(out, value)) return;
+        } else if (!std::is_same_v<T, char> && show_as_one_piece(out, value)) {
+            return;
+        }
+    }
+    out << shown(value) << " ";
 }
 
+namespace {
+
+// Shows values one behind the other from `at` on, up to where one might not fit in front of `end`. Moves `at`
+// behind the last one and returns how many there are.
+template <class T>
+unsigned int show_between(const std::ios_base& stream, char*& at, const char* end, const T* values,
+                          unsigned int n) {
+    unsigned int count = 0;
+    for (; count < n && end - at > static_cast<std::ptrdiff_t>(longest_value); ++count) {
+        char* const value_end = show(stream, at, shown(values[count]));
+        if (value_end == nullptr) break;
+        *value_end = ' ';
+        at = value_end + 1;
+    }
+    return count;
+}
+
+}  // namespace
+
+// Straight into the memory of the string while there is room in it. Decimals go through a block, and so does
+// what the string has to grow for.
 template <class T>
 KEL_FLATTEN unsigned int show_values(std::ostream& out, const T* values, unsigned int n) {
     if (!is_plain(out) || !is_over_string(out)) return 0;
-    KEL_UNINITIALIZED char block[512];
-    const char* const last_start = block + sizeof block - longest_value - 1;
-    char* at = block;
-    unsigned int count = 0;
-    for (; count < n && at <= last_start; ++count) {
-        char* const end = show(out, at, shown(values[count]));
-        if (end == nullptr) break;
-        *end = ' ';
-        at = end + 1;
+    if (!std::is_floating_point_v<T>) {
+        char* const begin = WriteArea::begin(out);
+        char* at = begin;
+        const unsigned int count = show_between(out, at, WriteArea::end(out), values, n);
+        WriteArea::fill(out, static_cast<std::size_t>(at - begin));
+        if (count > 0) return count;
     }
+    KEL_UNINITIALIZED char block[512];
+    char* at = block;
+    const unsigned int count = show_between(out, at, block + sizeof block, values, n);
     if (count > 0) write_through_buffer(out, block, static_cast<std::size_t>(at - block));
     return count;
 }
 
-#define KEL_SHOWN(T) template bool show_value(std::ostream&, T)
+#define KEL_SHOWN(T) template void write_value(std::ostream&, T)
 #define KEL_SHOWN_IN_ARRAYS(T) \
     KEL_SHOWN(T);              \
     template unsigned int show_values(std::ostream&, const T*, unsigned int)
@@ -143,7 +165,7 @@ KEL_SHOWN_IN_ARRAYS(wchar_t);
 KEL_SHOWN_IN_ARRAYS(float);
 KEL_SHOWN_IN_ARRAYS(double);
 
-void write_bare(std::ostream& out, unsigned long value) {
+KEL_FLATTEN void write_bare(std::ostream& out, unsigned long value) {
     if (!is_plain(out)) {
         out << value;
         return;
@@ -158,31 +180,6 @@ void write_bare(std::ostream& out, unsigned long value) {
 }
 
 // ---- reading ----
-
-namespace {
-
-template <class T>
-bool scan_next(Scan& scan, T& value) {
-    return scan_number(scan, value);
-}
-
-// Reads what operator>> stores in the low byte, whatever the number.
-bool scan_next(Scan& scan, unsigned char& value) {
-    int number;
-    if (!scan_number(scan, number)) return false;
-    value = static_cast<unsigned char>(number);
-    return true;
-}
-
-// A character that nothing follows is left to the ordinary way as well.
-bool scan_next(Scan& scan, char& c) {
-    if (scan.at_end()) return false;
-    c = *scan.at();
-    scan.advance();
-    return !scan.at_end();
-}
-
-}  // namespace
 
 template <class T>
 KEL_FLATTEN unsigned int scan_values(std::istream& in, T* values, unsigned int n) {
@@ -200,16 +197,7 @@ KEL_FLATTEN unsigned int scan_values(std::istream& in, T* values, unsigned int n
     return count;
 }
 
-template <class T>
-KEL_FLATTEN bool scan_item(std::istream& in, T& value) {
-    if (scan_values(in, &value, 1) == 0) return false;
-    take(in);
-    return true;
-}
-
-#define KEL_SCANNED(T)                                                  \
-    template unsigned int scan_values(std::istream&, T*, unsigned int); \
-    template bool scan_item(std::istream&, T&)
+#define KEL_SCANNED(T) template unsigned int scan_values(std::istream&, T*, unsigned int)
 KEL_SCANNED(char);
 KEL_SCANNED(unsigned char);
 KEL_SCANNED(short);

@@ -149,6 +149,19 @@ TEST(PlainWriting, ShowsUnsignedIntegersOfEveryLength) {
     each_alone_and_all(integers<unsigned long long>());
 }
 
+TEST(PlainWriting, ShowsTheLastDigitsOfLongIntegers) {
+    std::vector<unsigned int> values;
+    for (unsigned int value = 0; value < 4294000000u; value += value < 20000 ? 1 : 30011) {
+        values.push_back(value);
+    }
+    std::ostringstream shown;
+    KELostream(shown).put(values.data(), static_cast<unsigned int>(values.size()));
+    std::string known;
+    for (unsigned int value : values) known.append(std::to_string(value)).append(" ");
+    EXPECT_TRUE(shown.str() == known)
+        << "the texts have " << shown.str().size() << " and " << known.size() << " characters";
+}
+
 TEST(PlainWriting, ShowsDoublesOfEverySignAndExponent) { each_alone_and_all(doubles()); }
 TEST(PlainWriting, ShowsShortDecimalsAndTheirNeighbours) { each_alone_and_all(decimals()); }
 

@@ -3,7 +3,7 @@
 //
 //   ReadArea     characters to be read; more may come from the buffer when they are used up
 //   WriteArea    room to be filled; the buffer makes more when it is used up
-//   take         in.get(), for such a stream
+//   peek, take   in.peek() and in.get(), for such a stream
 //
 // A string buffer's own functions use its areas just so. They are protected, which keeps other classes from
 // them, but a pointer to a protected member may be formed in a class that derives.
@@ -42,9 +42,10 @@ public:
         return static_cast<std::size_t>(end(stream) - begin(stream));
     }
     static void fill(std::ios& stream, std::size_t n) {
-        for (; n > largest_step; n -= largest_step) (stream.rdbuf()->*(&WriteArea::pbump))(largest_step);
-        (stream.rdbuf()->*(&WriteArea::pbump))(static_cast<int>(n));
+        for (; n > largest_step; n -= largest_step) fill_few(stream, largest_step);
+        fill_few(stream, static_cast<int>(n));
     }
+    static void fill_few(std::ios& stream, int n) { (stream.rdbuf()->*(&WriteArea::pbump))(n); }
 };
 
 // The count of characters that the last unformatted input took.
@@ -52,6 +53,14 @@ class InputCount : std::istream {
 public:
     static void set(std::istream& in, std::streamsize n) { in.*(&InputCount::_M_gcount) = n; }
 };
+
+// Tells the next character as in.peek() does. For a stream over a string with nothing tied to it.
+inline int peek(std::istream& in) {
+    const char* const at = ReadArea::begin(in);
+    if (!in.good() || at == ReadArea::end(in)) return in.peek();
+    InputCount::set(in, 0);
+    return static_cast<unsigned char>(*at);
+}
 
 // Consumes the next character as in.get() does. For a stream over a string that throws nothing.
 inline int take(std::istream& in) {

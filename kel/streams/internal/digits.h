@@ -3,7 +3,7 @@
 //     char room[longest_integer];
 //     char* const end = show_integer(room, -4711);
 //
-// Digits are made four at a time in one word, by multiplications that do not wait for each other.
+// Digits are looked up two at a time, or made four at a time in one word where it matters how many they are.
 //
 // SPDX-License-Identifier: MIT
 #ifndef KEL_STREAMS_INTERNAL_DIGITS_H
@@ -35,15 +35,39 @@ inline std::uint32_t four_digits(std::uint32_t n) {
 
 constexpr std::uint32_t four_zeros = 0x30303030;
 
-// Numbers below 10,000 and 100,000,000 with leading zeros.
+// The numbers below 100 as two characters each.
+struct Pairs {
+    constexpr Pairs() : characters() {
+        for (int n = 0; n < 100; ++n) {
+            characters[n][0] = static_cast<char>('0' + n / 10);
+            characters[n][1] = static_cast<char>('0' + n % 10);
+        }
+    }
+    char characters[100][2];
+};
+constexpr Pairs pairs;
+
+// A fraction in units of 2^-32, of which the digits come out two at a time in front of the point: one
+// multiplication leaves them in one half of its result and the rest of the fraction in the other.
+inline std::uint32_t put_pair(char* at, std::uint32_t fraction) {
+    const std::uint64_t product = std::uint64_t(fraction) * 100;
+    copy_bytes<2>(at, pairs.characters[product >> 32]);
+    return static_cast<std::uint32_t>(product);
+}
+
+// Numbers below 10,000 and 100,000,000 with leading zeros. They become a fraction that is a little too large,
+// by less than any digit that is asked for.
 inline void put_four(char* at, std::uint32_t n) {
-    const std::uint32_t characters = four_digits(n) + four_zeros;
-    copy_bytes<4>(at, &characters);
+    const std::uint64_t hundreds = std::uint64_t(n) * 42949673;  // 2^32 / 100, rounded up
+    copy_bytes<2>(at, pairs.characters[hundreds >> 32]);
+    put_pair(at + 2, static_cast<std::uint32_t>(hundreds));
 }
 
 inline void put_eight(char* at, std::uint32_t n) {
-    put_four(at, n / 10000);
-    put_four(at + 4, n % 10000);
+    const std::uint64_t millions = std::uint64_t(n) * 2251799814;  // 2^51 / 10^6, rounded up
+    copy_bytes<2>(at, pairs.characters[millions >> 51]);
+    const std::uint32_t fraction = static_cast<std::uint32_t>(millions >> 19) + 1;
+    put_pair(at + 6, put_pair(at + 4, put_pair(at + 2, fraction)));
 }
 
 // The digits of a number below 10,000 without leading zeros, the first one lowest, and how many they are.
@@ -63,6 +87,15 @@ inline char* put_uppermost(char* at, std::uint32_t n) {
     const UpToFour digits(n);
     copy_bytes<4>(at, &digits.characters);
     return at + digits.count;
+}
+
+// A number below 100. A single digit is stored twice at the same place.
+inline char* put_up_to_two(char* at, std::uint32_t n) {
+    const int zeros = n < 10;
+    const char* const digits = pairs.characters[n];
+    at[0] = digits[zeros];
+    at[1 - zeros] = digits[1];
+    return at + 2 - zeros;
 }
 
 // A number below 10,000: its last two digits lie upon its first two.
@@ -101,7 +134,7 @@ inline char* show_integer(char* at, std::uint32_t n) {
         put_four(at, n % 10000);
         return at + 4;
     }
-    at = put_uppermost(at, n / 100000000);
+    at = put_up_to_two(at, n / 100000000);
     put_eight(at, n % 100000000);
     return at + 8;
 }
@@ -111,7 +144,7 @@ inline char* show_integer(char* at, std::uint64_t n) {
     const std::uint64_t upper = without_eight_digits(n);
     std::uint32_t uppermost = static_cast<std::uint32_t>(upper);
     if (upper > 0xffffffffu) {
-        uppermost = static_cast<std::uint32_t>(without_eight_digits(upper));
+        uppermost = static_cast<std::uint32_t>(upper >> 8) / (100000000 >> 8);  // upper has less than 40 bits
         at = show_integer(at, uppermost);
         put_eight(at, static_cast<std::uint32_t>(upper - uppermost * std::uint64_t(100000000)));
         at += 8;

@@ -20,14 +20,23 @@
 namespace kel {
 namespace internal {
 
-// Compares what the two objects hold instead of calling operator==, which takes as long as a number's
-// digits do. Equal bytes are the same locale; other ways of being equal only miss the short way. The
-// standard library's _M_getloc spares the copy that getloc() counts.
+// What a locale holds is one pointer, and two that hold the same are equal. Comparing them by operator==
+// takes as long as a number's digits do; other ways of being equal only miss the short way. The standard
+// library's _M_getloc spares the copy that getloc() counts.
+static_assert(sizeof(std::locale) == sizeof(void*), "a locale holds a pointer");
+inline const void* held_by(const std::locale& locale) {
+    const void* held;
+    std::memcpy(&held, &locale, sizeof held);
+    return held;
+}
+
+// What the classic locale holds, as soon as a stream was asked for it.
+extern const void* known_classic;
+bool learn_classic(const std::ios_base& stream);
+
 inline bool has_classic_locale(const std::ios_base& stream) {
-    static const std::locale& classic = std::locale::classic();
-    const void* const held = &stream._M_getloc();
-    const void* const wanted = &classic;
-    return std::memcmp(held, wanted, sizeof(std::locale)) == 0;
+    const void* const known = __atomic_load_n(&known_classic, __ATOMIC_RELAXED);
+    return held_by(stream._M_getloc()) == known || learn_classic(stream);
 }
 
 // Has no tied stream to flush, no flush of its own after each piece (a flag), and throws nothing.

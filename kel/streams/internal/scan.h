@@ -6,8 +6,8 @@
 #ifndef KEL_STREAMS_INTERNAL_SCAN_H
 #define KEL_STREAMS_INTERNAL_SCAN_H
 
+#include <kel/core/internal/attributes.h>
 #include <kel/streams/internal/decimals.h>
-#include <kel/streams/internal/uninitialized.h>
 
 #include <cstdint>
 #include <limits>
@@ -26,11 +26,16 @@ public:
     bool is(char c) const { return _at != _end && *_at == c; }
 
     void skip_blanks() {
-        while (_at != _end && (*_at == ' ' || (*_at >= '\t' && *_at <= '\r'))) ++_at;
+        for (; _at != _end; ++_at) {
+            const unsigned char c = static_cast<unsigned char>(*_at);
+            if (c > ' ' || (c != ' ' && (c < '\t' || c > '\r'))) break;
+        }
     }
 
     // Goes on to the next character. There is one now.
     void advance() { ++_at; }
+
+    void go_on_at(const char* at) { _at = at; }
 
     bool accept(char c) {
         if (!is(c)) return false;
@@ -41,6 +46,15 @@ public:
     // The value of the digit that comes next; any other character, and none, gives 10 or more.
     unsigned digit() const { return _at != _end ? static_cast<unsigned>(*_at) - '0' : 10; }
 
+    // The digits that come next, at most `most` of them, behind those that `number` has; gives how many.
+    int append_digits(int most, std::uint32_t& number) {
+        const char* const begin = _at;
+        const char* const stop = _end - _at > most ? _at + most : _end;
+        for (unsigned digit; _at != stop && (digit = static_cast<unsigned>(*_at) - '0') < 10; ++_at)
+            number = number * 10 + digit;
+        return static_cast<int>(_at - begin);
+    }
+
 private:
     const char* _at;
     const char* const _end;
@@ -50,25 +64,19 @@ private:
 struct FewDigits {
     static constexpr int most = 9;
 
-    explicit FewDigits(Scan& scan) {
-        for (unsigned digit; count < most && (digit = scan.digit()) < 10; ++count) {
-            number = number * 10 + digit;
-            scan.advance();
-        }
-    }
+    explicit FewDigits(Scan& scan) : number(0), count(scan.append_digits(most, number)) {}
 
-    std::uint32_t number = 0;
-    int count = 0;
+    std::uint32_t number;
+    int count;
 };
 
-// As many digits as 64 bits hold whatever they are; `whole` tells that no more follow.
+// As many digits as 64 bits hold whatever they are.
 struct Digits {
     explicit Digits(Scan& scan) {
         KEL_UNINITIALIZED const FewDigits first(scan);
         number = first.number;
         count = first.count;
         if (count == FewDigits::most) add(scan);
-        whole = scan.digit() >= 10;
     }
 
     // Appends up to as many digits again.
@@ -82,7 +90,6 @@ struct Digits {
 
     std::uint64_t number;
     int count;
-    bool whole;
 };
 
 // The most that a T may be away from 0 on the one side and on the other.
@@ -94,21 +101,31 @@ std::uint64_t largest(bool negative) {
 }
 
 // Each gives the value, or false for a number of the ordinary way. The scan has then gone anywhere.
+// A number with more digits than always fit, of which `number` has the first ones: some do.
+template <class T>
+[[gnu::noinline]] bool scan_rest(Scan& scan, bool negative, std::uint64_t number, T& value) {
+    for (; scan.digit() < 10; scan.advance()) {
+        if (__builtin_mul_overflow(number, 10u, &number)) return false;
+        if (__builtin_add_overflow(number, scan.digit(), &number)) return false;
+    }
+    if (scan.at_end() || number > largest<T>(negative)) return false;
+    value = static_cast<T>(negative ? 0 - number : number);
+    return true;
+}
+
 template <class T>
 std::enable_if_t<std::is_integral_v<T>, bool> scan_number(Scan& scan, T& value) {
     const bool negative = std::is_signed_v<T> && scan.accept('-');
-    KEL_UNINITIALIZED Digits digits(scan);
-    if (!digits.whole) {
-        // The nineteenth digit and the twentieth, which fits only at times.
-        std::uint64_t number = digits.number;
-        for (; scan.digit() < 10; scan.advance()) {
-            if (__builtin_mul_overflow(number, 10u, &number)) return false;
-            if (__builtin_add_overflow(number, scan.digit(), &number)) return false;
-        }
-        digits.number = number;
+    KEL_UNINITIALIZED const std::conditional_t<sizeof(T) <= 4, FewDigits, Digits> first(scan);
+    if (scan.at_end() || first.count == 0) return false;
+    // So many digits fit into 32 and into 64 bits.
+    if (sizeof(T) < 4 || scan.digit() < 10) {
+        Scan rest = scan;  // has an address, which the scan of all others need not have
+        const bool found = scan_rest(rest, negative, first.number, value);
+        scan.go_on_at(rest.at());
+        return found;
     }
-    if (scan.at_end() || digits.count == 0 || digits.number > largest<T>(negative)) return false;
-    value = static_cast<T>(negative ? 0 - digits.number : digits.number);
+    value = static_cast<T>(negative ? 0 - first.number : first.number);
     return true;
 }
 

@@ -37,15 +37,9 @@ inline int shown(unsigned char value) { return value; }
 inline int shown(wchar_t value) { return static_cast<int>(value); }
 inline double shown(float value) { return value; }
 
-// Writes one value and its separator, if it has a short way on this stream. Otherwise it is left to the
-// standard inserter.
+// Writes one value and its separator.
 template <class T>
-bool show_value(std::ostream& out, T value);
-
-template <class T>
-void write_value(std::ostream& out, T value) {
-    if (!show_value(out, value)) out << shown(value) << " ";
-}
+void write_value(std::ostream& out, T value);
 
 // Writes as many of `n` values as have a short way on this stream and fit into one block, and returns
 // how many. The next one, if there is one to write, has to be written by itself.
@@ -59,10 +53,6 @@ void write_bare(std::ostream& out, unsigned long value);
 // there is one to read, is left to the standard extractor, which finds what it would have found.
 template <class T>
 unsigned int scan_values(std::istream& in, T* values, unsigned int n);
-
-// Reads one value and the character behind it, if they have a short way.
-template <class T>
-bool scan_item(std::istream& in, T& value);
 
 template <class T>
 void extract_value(std::istream& in, T& value) {
@@ -79,19 +69,6 @@ void extract_number(std::istream& in, T& value) {
 }
 inline void extract_value(std::istream& in, unsigned char& value) { extract_number(in, value); }
 inline void extract_value(std::istream& in, wchar_t& value) { extract_number(in, value); }
-
-template <class T>
-void read_value(std::istream& in, T& value) {
-    if (scan_values(in, &value, 1) == 0) extract_value(in, value);
-}
-
-// Reads a value and the character behind it.
-template <class T>
-void read_item(std::istream& in, T& value) {
-    if (scan_item(in, value)) return;
-    extract_value(in, value);
-    in.get();
-}
 
 }  // namespace internal
 }  // namespace kel

@@ -1,0 +1,98 @@
+// The short way of a single value: on a plain stream over a string it goes straight into the memory of the
+// string or comes out of it. These are in line in the streams' operators, where nothing but the digits takes
+// longer than a call.
+//
+//   show_in_memory    writes one value and its separator
+//   scan_in_memory    reads one value, alone or with the character behind it
+//
+// Both return false, and have changed nothing, where the value has to go another way.
+//
+// SPDX-License-Identifier: MIT
+#ifndef KEL_STREAMS_INTERNAL_SHORT_WAY_H
+#define KEL_STREAMS_INTERNAL_SHORT_WAY_H
+
+#include <kel/core/internal/attributes.h>
+#include <kel/streams/internal/areas.h>
+#include <kel/streams/internal/digits.h>
+#include <kel/streams/internal/plain.h>
+#include <kel/streams/internal/scan.h>
+#include <kel/streams/internal/text.h>
+
+namespace kel {
+namespace internal {
+
+constexpr std::size_t longest_value = longest_integer;
+static_assert(longest_decimal <= longest_value, "both kinds of numbers have room");
+
+template <class T>
+bool show_in_memory(std::ostream& out, T value) {
+    std::ios& stream = out;
+    if (!is_plain(stream) || !is_over_string(stream) || WriteArea::room(stream) <= longest_value)
+        return false;
+    char* const begin = WriteArea::begin(stream);
+    char* const end = show_integer(begin, shown(value));
+    *end = ' ';
+    WriteArea::fill_few(stream, static_cast<int>(end + 1 - begin));
+    return true;
+}
+
+// A character is no number.
+inline bool show_in_memory(std::ostream& out, char c) {
+    std::ios& stream = out;
+    if (!is_plain(stream) || !is_over_string(stream) || WriteArea::room(stream) < 2) return false;
+    char* const at = WriteArea::begin(stream);
+    at[0] = c;
+    at[1] = ' ';
+    WriteArea::fill_few(stream, 2);
+    return true;
+}
+
+// Decimals spoil what stands behind them while they are shown, and go through other memory.
+inline bool show_in_memory(std::ostream&, double) { return false; }
+inline bool show_in_memory(std::ostream&, float) { return false; }
+
+template <class T>
+bool scan_next(Scan& scan, T& value) {
+    return scan_number(scan, value);
+}
+
+// Reads what operator>> stores in the low byte, whatever the number.
+inline bool scan_next(Scan& scan, unsigned char& value) {
+    int number;
+    if (!scan_number(scan, number)) return false;
+    value = static_cast<unsigned char>(number);
+    return true;
+}
+
+// A character that nothing follows is left to the ordinary way, as a number is.
+inline bool scan_next(Scan& scan, char& c) {
+    if (scan.at_end()) return false;
+    c = *scan.at();
+    scan.advance();
+    return !scan.at_end();
+}
+
+// A value and `behind` characters after it, one or none.
+template <int behind, class T>
+bool scan_in_memory(std::istream& in, T& value) {
+    std::ios& stream = in;
+    if (!is_plain(stream) || !is_over_string(stream)) return false;
+    const char* const begin = ReadArea::begin(stream);
+    KEL_UNINITIALIZED Scan scan(begin, ReadArea::end(stream));
+    scan.skip_blanks();
+    if (!scan_next(scan, value)) return false;
+    ReadArea::consume(stream, scan.at() + behind - begin);
+    if (behind > 0) InputCount::set(in, behind);
+    return true;
+}
+
+// Reads a value in the shortest way that it has.
+template <class T>
+void read_value(std::istream& in, T& value) {
+    if (!scan_in_memory<0>(in, value)) extract_value(in, value);
+}
+
+}  // namespace internal
+}  // namespace kel
+
+#endif
