@@ -1,6 +1,6 @@
 # shellcheck shell=bash
-# Memory and descriptors at 32 bit, as valgrind sees them: each test program in one process, without a
-# list of suppressions.
+# Memory and descriptors at 32 bit, as valgrind sees them: each test program in one process or in a
+# few, without a list of suppressions.
 
 # Programs whose tests start other programs, which valgrind does not follow.
 starts_others='test_(startup|examples|services_driver)'
@@ -13,18 +13,22 @@ not_for_memcheck+=':QuotedString.WithoutAnEndFillsTheLargestRoomThatThereIs'
 not_for_memcheck+=':Pipe.WithNoDescriptorsLeftThrowsNoResourcesWithEmfile'
 not_for_memcheck+=':Strings.AllocOfMoreThanTheAddressSpaceThrowsBadAlloc'
 
-# Runs test program $1. What valgrind says goes to build/memcheck/<program>.valgrind, what the tests say
-# beside it. The program's own operator new is left to it, as tests make it fail. Children that end in
+# Programs that take minutes, in so many parts: the scenarios of which every call and every allocation fails.
+parts_of() { case $1 in */test_matrix*) echo 8 ;; *) echo 1 ;; esac }
+
+# Runs part $2 of the $3 parts of test program $1. What valgrind says goes to build/memcheck/*.valgrind, what the
+# tests say beside it. The program's own operator new is left to it, as tests make it fail. Children that end in
 # the middle of a test are watched but tell nothing at their end.
 under_memcheck() {
     local name log
     name=$(basename "$1")
-    log=$PWD/build/memcheck/$name
-    (cd "$(dirname "$1")" && valgrind --tool=memcheck --soname-synonyms=somalloc=nouserintercepts \
+    log=$PWD/build/memcheck/$name.$2
+    (cd "$(dirname "$1")" && GTEST_SHARD_INDEX=$2 GTEST_TOTAL_SHARDS=$3 \
+        valgrind --tool=memcheck --soname-synonyms=somalloc=nouserintercepts \
         --leak-check=full --show-leak-kinds=definite --errors-for-leak-kinds=definite --track-fds=yes \
         --child-silent-after-fork=yes --num-callers=30 --log-file="$log.valgrind" \
         "./$name" --gtest_brief=1 --gtest_filter="$not_for_memcheck") </dev/null >"$log.tests" 2>&1 ||
-        grep -aE "FAILED|Failure" "$log.tests" || echo "$name did not come to its end"
+        grep -aE "FAILED|Failure" "$log.tests" || echo "part $2 of $name did not come to its end"
 }
 
 # The sum of the numbers that the expression $1 finds in the files $2.
@@ -45,7 +49,7 @@ around() {
 }
 
 memcheck() {
-    local logs=build/memcheck programs failed errors tests passed left
+    local logs=build/memcheck programs program part parts failed errors tests passed left
     { cmake --preset x86 && cmake --build --preset x86 --parallel "$(nproc)"; } >build/memcheck.build.log 2>&1 || {
         cat build/memcheck.build.log
         return 1
@@ -55,9 +59,12 @@ memcheck() {
     export not_for_memcheck
     export -f under_memcheck
     mapfile -t programs < <(find build/x86/tests -type f -executable -name 'test_*' | grep -vE "/$starts_others\$" | sort)
+    # The long ones first. Each line is a program, a part and their number.
     # shellcheck disable=SC2016  # the inner shell expands it
-    failed=$(printf '%s\0' "${programs[@]}" |
-        xargs -0 -n 1 -P "$(nproc)" bash -c 'under_memcheck "$1"' -)
+    failed=$(for program in "${programs[@]}"; do
+        parts=$(parts_of "$program")
+        for ((part = 0; part < parts; ++part)); do echo "$program $part $parts"; done
+    done | sort -k 3,3nr | xargs -L 1 -P "$(nproc)" bash -c 'under_memcheck "$@"' -)
     [ -z "$failed" ] || echo "$failed"
     tests=$(sum_of '\] ([0-9]+) tests? from .* ran\.' $logs/*.tests)
     passed=$(sum_of '  PASSED  \] ([0-9]+) test' $logs/*.tests)
