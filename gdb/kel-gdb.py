@@ -90,15 +90,20 @@ RESOLVER = {-1: 'EAI_BADFLAGS', -2: 'EAI_NONAME', -3: 'EAI_AGAIN', -4: 'EAI_FAIL
             -11: 'EAI_SYSTEM', -12: 'EAI_OVERFLOW'}
 
 
-# The set and the number of a minor code, and what they may stand for.
-def minor_text(code):
+# The exceptions of which a minor code may be an errno or a resolver's code.
+OF_THE_SYSTEM = ('CORBA_NO_RESOURCES', 'CORBA_COMM_FAILURE', 'CORBA_TRANSIENT')
+
+
+# The set and the number of a minor code of an exception of that class, and what they may stand for.
+def minor_text(code, class_name):
     code &= 0xffffffff
     vendor, low = code & 0xfffff000, code & 0xfff
-    if code - (1 << 32) in RESOLVER:
+    of_the_system = class_name in OF_THE_SYSTEM
+    if of_the_system and code - (1 << 32) in RESOLVER:
         said = 'resolver %s' % RESOLVER[code - (1 << 32)]
     elif vendor == 0x4f4d0000:
         said = 'OMG %d' % low
-        if low in errno.errorcode:
+        if of_the_system and low in errno.errorcode:
             said += ', as an errno %s' % errno.errorcode[low]
     elif vendor == 0x4b450000:
         said = 'KEL %d' % low + (', ' + OWN_CODES[low] if low in OWN_CODES else '')
@@ -122,10 +127,23 @@ class SystemException:
     def to_string(self):
         value = self.value
         status = number(value['_completed'])
-        text = '%s, minor %s, %s' % (exception_class(value), attempt(lambda: minor_text(int(value['_minor']))),
+        name = exception_class(value)
+        text = '%s, minor %s, %s' % (name, attempt(lambda: minor_text(int(value['_minor']), name)),
                                      STATUS.get(status, 'completion status %s' % status))
         reason = attempt(lambda: narrow(value['_reason']['_ptr']))
         return text if reason in ('""', 'null') else text + ', reason ' + reason
+
+
+# An exception seen as the base of all: what it is, and for a system exception all of it. A user exception shows
+# its own fields and asks for this text as one of them.
+class AnyException:
+    def __init__(self, value):
+        self.value = value
+
+    def to_string(self):
+        value = attempt(lambda: self.value.cast(self.value.dynamic_type), self.value)
+        kind = value.type.strip_typedefs()
+        return SystemException(value).to_string() if is_standard(kind) else kind.tag
 
 
 class LoadError:
@@ -391,7 +409,8 @@ class Logger:
 EXACT = {
     'CORBA_String_var': NarrowText, 'KELStringWrapper': NarrowText, 'CORBA_String_out': NarrowText,
     'CORBA_WString_var': WideText, 'CORBA_WString_out': WideText,
-    'CORBA_SystemException': SystemException, 'KELStdException': SystemException,
+    'CORBA_Exception': AnyException, 'CORBA_SystemException': SystemException,
+    'KELStdException': SystemException,
     'KELLoadLibrary::LoadError': LoadError, 'CORBA_Exception_var': Holder, 'CORBA_Environment': Environment,
     'CORBA_Exception::Description': Description,
     'KELMutex': Mutex, 'KELRMutex': Mutex, 'KELRWLock': RWLock, 'KELThread': Thread, 'KELThreadId': ThreadId,

@@ -132,6 +132,11 @@ def members(header):
     return out
 
 
+# A first word in capitals, such as TCP, keeps them.
+def begun_small(sentence):
+    return sentence if sentence[1:2].isupper() else sentence[0].lower() + sentence[1:]
+
+
 def page(header, path, name, version, others):
     brief = header.opening[0].content[0].rstrip('.')
     brief = re.sub(r'[,:] .*$', '', brief)
@@ -139,7 +144,7 @@ def page(header, path, name, version, others):
     out = ['.\\" Made by scripts/man from kel/%s.' % path,
            '.TH %s 3 2026-11-22 "KEL %s" "KEL Library Functions"' % (name, version),
            '.SH NAME']
-    out += [text(', '.join(everything)) + ' \\- ' + text(brief[0].lower() + brief[1:])]
+    out += [text(', '.join(everything)) + ' \\- ' + text(begun_small(brief))]
     out += ['.SH LIBRARY', 'The runtime\\-support and portability library of an ORB (libkel, \\-lkel)',
             '.SH SYNOPSIS', '.B #include <kel/%s>' % path, '.SH DESCRIPTION']
     said = paragraphs(header.opening)

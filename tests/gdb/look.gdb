@@ -52,6 +52,9 @@ print *(CORBA_Exception::Description*)scribbled
 echo == the rest\n
 print counted
 print logger
+print seen_by_root
+print user_seen_by_root
+print no_errno
 kel exceptions
 kill
 quit

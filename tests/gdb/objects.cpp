@@ -59,6 +59,10 @@ int main() KEL_NO_THREAD_SAFETY_ANALYSIS {
     CORBA::BAD_PARAM foreign(0x12345007, CORBA::COMPLETED_YES, "the name is empty");
     CORBA::Exception_var holder(CORBA_TRANSIENT::_factory());
     const CORBA::SystemException& seen_by_base = foreign;
+    const CORBA::Exception& seen_by_root = late;
+    const CORBA::BAD_PARAM no_errno(5, CORBA::COMPLETED_NO);
+    const KELRemarshal again;
+    const CORBA::Exception& user_seen_by_root = again;
 
     KELDictionary<KELStringWrapper, int> sizes;
     sizes.add("latin-1", 1);
@@ -103,6 +107,7 @@ int main() KEL_NO_THREAD_SAFETY_ANALYSIS {
     recursive.unlock();
     lock.unlock();
     return static_cast<int>(
-        seen_by_base.minor() &
+        seen_by_base.minor() & no_errno.minor() &
+        static_cast<unsigned long>(&seen_by_root == &user_seen_by_root) &
         static_cast<unsigned long>(borrowed.in() == 0 && scribbled[0] == 0 && nowhere.text.in() == 0));
 }

@@ -103,6 +103,24 @@ cmake_package_refuses_the_other_word_size() {
     refuses "version: 1.* (${bits}bit)" -DCMAKE_CXX_FLAGS="-m$((96 - bits))"
 }
 
+# Makes the folder $1 a CMake package like $package, but for programs of $2 bits and with the configuration $3.
+stand_in() {
+    mkdir -p "$1"
+    echo "$3" >"$1/kel-config.cmake"
+    sed "s/\"$((bits / 8))\"/\"$(($2 / 8))\"/" "$package/kel-config-version.cmake" >"$1/kel-config-version.cmake"
+}
+
+# Both word sizes in one prefix, in the folders that README gives them; the other one cannot be used.
+cmake_package_of_the_right_word_size_is_found() {
+    local two=$work/two package own=lib other=lib/x86_64-linux-gnu
+    [ "$bits" -eq 32 ] || { own=lib/x86_64-linux-gnu other=lib; }
+    package=$(dirname "$(find "$root" -name kel-config.cmake)")
+    rm -rf "$two"
+    stand_in "$two/$own/cmake/kel" "$bits" "include($package/kel-config.cmake)"
+    stand_in "$two/$other/cmake/kel" $((96 - bits)) 'message(FATAL_ERROR "the other word size was taken")'
+    build find_package -DCMAKE_PREFIX_PATH="$two" -DCONSUMER_LIBRARY=kel::kel
+}
+
 cmake_package_refuses_another_major_version() {
     refuses 'version: 1' -DCMAKE_CXX_FLAGS="${flags[*]}" -DCONSUMER_VERSION=2.0
 }

@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include <kel/containers/strings.h>
+#include <kel/exceptions/explain.h>
 #include <kel/exceptions/standard.h>
 #include <kel/os/address.h>
 #include <kel/os/portable.h>
@@ -35,7 +36,8 @@ int main() {
     try {
         KELPortable::tcpConnect("127.0.0.1", port, 0, "");
     } catch (const CORBA::TRANSIENT& refused) {
-        std::cout << "refused: errno " << (refused.minor() & 0xfff) << "\n";
+        const CORBA::String_var why(kel_explain(refused));  // the host and the port are not in it
+        std::cout << "127.0.0.1, the port from before: " << why << "\n";
     }
 
     // A bind name that is no address of this machine's.
