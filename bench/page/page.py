@@ -39,7 +39,8 @@ def goal_text(work):
     if reached is None:
         return f"at most {work.goal.most:g} of {work.goal.peer}: absent"
     verdict = "met" if reached <= work.goal.most else "missed"
-    return f"at most {work.goal.most:g} of {work.goal.peer}: {reached:.2f}, {verdict}"
+    digits = 3 if round(reached, 2) == work.goal.most else 2
+    return f"at most {work.goal.most:g} of {work.goal.peer}: {reached:.{digits}f}, {verdict}"
 
 
 def is_missed(work):
