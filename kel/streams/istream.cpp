@@ -72,18 +72,21 @@ int KEListream::_type_number() { return 0; }
 
 namespace {
 
-// The ordinary way of a value and the character behind it, kept out of the short one.
+// The ordinary way of a value and the character behind it, kept out of the short one. What was read before
+// the stream throws is counted.
 template <class T>
-[[gnu::noinline]] void read_item(std::istream& in, T& value) {
-    extract_value(in, value);
-    in.get();
+[[gnu::noinline]] KEListream& extract_with_facets(KEListream& in, T& value, std::uint32_t size) {
+    extract_value(*in._strm, value);
+    in._offset += size;
+    in._strm->get();
+    in._offset += 1;
+    return in;
 }
 
 // Reads one value and the separator behind it. `size` is what the value itself counts.
 template <class T>
 KEL_FLATTEN KEListream& extract(KEListream& in, T& value, std::uint32_t size) {
-    std::istream& stream = text(in._strm);
-    if (!scan_in_memory<1>(stream, value)) read_item(stream, value);
+    if (!scan_in_memory<1>(text(in._strm), value)) return extract_with_facets(in, value, size);
     in._offset += size + 1;
     return in;
 }

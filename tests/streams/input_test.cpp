@@ -258,6 +258,15 @@ TEST(InputScalars, UnsignedCharCountsFourAndOne) {
     EXPECT_EQ(r.in.cur_in_offset(), 5u);
 }
 
+TEST(InputScalars, ASeparatorThatThrowsLeavesTheValueCounted) {
+    Reader r("7");
+    r.text.exceptions(std::ios::failbit);
+    double value = 0;
+    EXPECT_THROW(r.in >> value, std::ios_base::failure);
+    EXPECT_EQ(value, 7);
+    EXPECT_EQ(r.in.cur_in_offset(), 8u);
+}
+
 TEST(InputScalars, ReadingBackCountsDifferentlyFromWriting) {
     Writer w;
     w.out << short(-2) << 7 << static_cast<unsigned char>(200) << 'x';
