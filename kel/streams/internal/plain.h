@@ -25,8 +25,9 @@ namespace internal {
 // library's _M_getloc spares the copy that getloc() counts.
 static_assert(sizeof(std::locale) == sizeof(void*), "a locale holds a pointer");
 inline const void* held_by(const std::locale& locale) {
+    const void* const object = &locale;
     const void* held;
-    std::memcpy(&held, &locale, sizeof held);
+    std::memcpy(&held, object, sizeof held);
     return held;
 }
 
