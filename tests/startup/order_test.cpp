@@ -74,6 +74,7 @@ protected:
         const Outcome o = start({"order"}, {"DEBUG_STATIC"});
         std::istringstream lines(o.out);
         std::string line;
+        _lines.clear();  // of an earlier round
         while (std::getline(lines, line)) _lines.push_back(line);
     }
 
