@@ -184,8 +184,9 @@ TEST(ThreadRegistry, KnowsEveryThreadAndForgetsItsObject) {
             (new SelfDeleting(running, found))->run();
             NeverRun newer;
         }
+        // Until its thread runs, an object has the identifier of who made it. No thread may get that one.
+        running.wait();
     });
-    running.wait();
     EXPECT_EQ(found, crowd * each);
     KELMutex_var hold(KELThread::_mutex, 1);
     EXPECT_EQ(KELThread::_first, nullptr);
