@@ -11,23 +11,20 @@ starts_others='test_(startup|examples|services_driver)'
 not_for_memcheck='-DictionaryModel.*'
 not_for_memcheck+=':QuotedString.WithoutAnEndFillsTheLargestRoomThatThereIs'
 not_for_memcheck+=':Pipe.WithNoDescriptorsLeftThrowsNoResourcesWithEmfile'
-not_for_memcheck+=':PlainReading.TakesDoublesOfEverySignAndExponent'
-not_for_memcheck+=':PlainReading.TakesDecimalsThatLieBetweenTwoNumbers'
-not_for_memcheck+=':PlainReading.TakesIntegersOfEveryLength'
 not_for_memcheck+=':Strings.AllocOfMoreThanTheAddressSpaceThrowsBadAlloc'
 
 # Programs that take minutes, in so many parts: the scenarios of which every call and every allocation fails, and
 # what strangers may send.
 parts_of() { case $1 in */test_matrix* | */test_streams) echo 8 ;; *) echo 1 ;; esac }
 
-# Runs part $2 of the $3 parts of test program $1. What valgrind says goes to build/memcheck/*.valgrind, what the
+# Runs part $2 of the $3 parts of test program $1. What valgrind says goes to $logs/*.valgrind, what the
 # tests say beside it. The program's own operator new is left to it, as tests make it fail. Children that end in
 # the middle of a test are watched but tell nothing at their end.
 under_memcheck() {
     local name log
     name=$(basename "$1")
-    log=$PWD/build/memcheck/$name.$2
-    (cd "$(dirname "$1")" && GTEST_SHARD_INDEX=$2 GTEST_TOTAL_SHARDS=$3 KEL_MATRIX_WITHOUT_PAIRS=1 \
+    log=$PWD/$logs/$name.$2
+    (cd "$(dirname "$1")" && GTEST_SHARD_INDEX=$2 GTEST_TOTAL_SHARDS=$3 \
         valgrind --tool=memcheck --soname-synonyms=somalloc=nouserintercepts \
         --leak-check=full --show-leak-kinds=definite --errors-for-leak-kinds=definite --track-fds=yes \
         --child-silent-after-fork=yes --num-callers=30 --log-file="$log.valgrind" \
@@ -49,20 +46,21 @@ left_open() {
 
 # What valgrind said where the expression $1 matches.
 around() {
-    { grep -ahE -A 12 "$1" build/memcheck/*.valgrind || true; } | cut -c 1-160 | sed -n 1,200p
+    { grep -ahE -A 12 "$1" "$logs"/*.valgrind || true; } | cut -c 1-160 | sed -n 1,200p
 }
 
-memcheck() {
-    local logs=build/memcheck programs program part parts failed errors tests passed left
-    { cmake --preset x86 && cmake --build --preset x86 --parallel "$(nproc)"; } >build/memcheck.build.log 2>&1 || {
-        cat build/memcheck.build.log
-        return 1
-    }
-    rm -rf $logs
-    mkdir -p $logs
-    export not_for_memcheck
+# Watches the test programs whose names match $1 and do not match $2.
+watch_memory() {
+    local programs program part parts failed errors tests passed left
+    build x86 || return 1
+    # shellcheck disable=SC2154  # scripts/check sets it
+    logs=build/$gate
+    rm -rf "$logs"
+    mkdir -p "$logs"
+    export not_for_memcheck logs
     export -f under_memcheck
-    mapfile -t programs < <(find build/x86/tests -type f -executable -name 'test_*' | grep -vE "/$starts_others\$" | sort)
+    mapfile -t programs < <(find build/x86/tests -type f -executable -name 'test_*' |
+        grep -E "/($1)\$" | grep -vE "/($2)\$" | sort)
     # The long ones first. Each line is a program, a part and their number.
     # shellcheck disable=SC2016  # the inner shell expands it
     failed=$(for program in "${programs[@]}"; do
@@ -70,13 +68,17 @@ memcheck() {
         for ((part = 0; part < parts; ++part)); do echo "$program $part $parts"; done
     done | sort -k 3,3nr | xargs -L 1 -P "$(nproc)" bash -c 'under_memcheck "$@"' -)
     [ -z "$failed" ] || echo "$failed"
-    tests=$(sum_of '\] ([0-9]+) tests? from .* ran\.' $logs/*.tests)
-    passed=$(sum_of '  PASSED  \] ([0-9]+) test' $logs/*.tests)
-    errors=$(sum_of 'ERROR SUMMARY: ([0-9]+) errors' $logs/*.valgrind)
-    left=$(left_open $logs/*.valgrind)
+    tests=$(sum_of '\] ([0-9]+) tests? from .* ran\.' "$logs"/*.tests)
+    passed=$(sum_of '  PASSED  \] ([0-9]+) test' "$logs"/*.tests)
+    errors=$(sum_of 'ERROR SUMMARY: ([0-9]+) errors' "$logs"/*.valgrind)
+    left=$(left_open "$logs"/*.valgrind)
     [ "$errors" -eq 0 ] || around '^==[0-9]+== (Invalid|Conditional|Use of|Syscall|Mismatched|Argument|[0-9,]+ .* definitely)'
     [ "$left" -eq 0 ] || around ' Open (file descriptor|AF_)'
-    echo "memcheck: $passed of $tests tests passed in ${#programs[@]} programs, $errors errors and definite leaks," \
+    echo "$gate: $passed of $tests tests passed in ${#programs[@]} programs, $errors errors and definite leaks," \
         "$left descriptors left open"
     [ -z "$failed" ] && [ "$errors" -eq 0 ] && [ "$left" -eq 0 ]
 }
+
+faulty='test_matrix(_[a-z]+)?'
+memcheck() { watch_memory 'test_.*' "$starts_others|$faulty"; }
+memcheck_faults() { watch_memory "$faulty" "$starts_others"; }

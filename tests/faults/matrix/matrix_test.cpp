@@ -5,7 +5,6 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <cstdlib>
 #include <set>
 #include <sstream>
 
@@ -87,7 +86,7 @@ private:
     void one(const Fault& fault) {
         const Seen seen = judge({fault});
         _report.note("row", std::string(fault.seam->name()) + " " + std::to_string(fault.error));
-        if (fault.from_then_on || !_definition.pairs || without_pairs()) return;
+        if (fault.from_then_on || !_definition.pairs) return;
         // A failure that changes nothing leaves every other one what it is by itself.
         if (expected(_definition, {fault}).ignored && same(seen.calls, _usual.calls)) return;
         bool later = false;
@@ -100,9 +99,6 @@ private:
             later = later || (call.seam == fault.seam && call.nth == fault.nth);
         }
     }
-
-    // For tools under which all pairs would take too long.
-    static bool without_pairs() { return std::getenv("KEL_MATRIX_WITHOUT_PAIRS") != nullptr; }
 
     // Whichever error ends the process, it ends it alike, and that takes a process.
     bool is_worth_a_pair(const Fault& second) const {
