@@ -17,6 +17,14 @@ using kel::internal::text;
 
 static std::ios_base::Init iostreams;
 
+namespace kel {
+namespace internal {
+
+const void* classic_locale_holds = held_by(std::locale::classic());
+
+}  // namespace internal
+}  // namespace kel
+
 // ---- the process's own standard streams ----
 
 namespace kel {

@@ -19,8 +19,7 @@ using kel::internal::error_stream;
 using kel::internal::Escape;
 using kel::internal::escapes;
 using kel::internal::is_cin;
-using kel::internal::is_over_string;
-using kel::internal::is_plain;
+using kel::internal::is_plain_string;
 using kel::internal::QuotedTarget;
 using kel::internal::read_quoted_text;
 using kel::internal::read_value;
@@ -53,7 +52,7 @@ wchar_t* new_wide_array(std::uint32_t n) {
 // The characters of a stream one by one, in the shortest way that it has.
 class Characters {
 public:
-    explicit Characters(std::istream& in) : _in(in), _in_memory(is_plain(in) && is_over_string(in)) {}
+    explicit Characters(std::istream& in) : _in(in), _in_memory(is_plain_string(in)) {}
 
     bool in_memory() const { return _in_memory; }
     int peek() { return _in_memory ? kel::internal::peek(_in) : _in.peek(); }
@@ -66,9 +65,10 @@ private:
 
 // Consumes the opening quote if it comes next, as it does where the writer has been.
 bool take_quote(std::istream& in) {
-    const char* const at = ReadArea::begin(in);
-    if (at == ReadArea::end(in) || *at != '"') return false;
-    ReadArea::consume(in, 1);
+    std::streambuf& string = *in.rdbuf();
+    const char* const at = ReadArea::begin(string);
+    if (at == ReadArea::end(string) || *at != '"') return false;
+    ReadArea::consume(string, 1);
     return true;
 }
 

@@ -52,11 +52,18 @@ KELostream& endl(KELostream& out) {
 
 namespace {
 
+// The longer ways, kept out of the short one.
+template <class T>
+[[gnu::noinline]] KELostream& insert_elsewhere(KELostream& out, T value, std::uint32_t size) {
+    write_value(*out._strm, value);
+    out._offset += size + 1;
+    return out;
+}
+
 // Writes one value and its separator. `size` is what the value itself counts.
 template <class T>
 KEL_FLATTEN KELostream& insert(KELostream& out, T value, std::uint32_t size) {
-    std::ostream& stream = text(out._strm);
-    if (!show_in_memory(stream, value)) write_value(stream, value);
+    if (!show_in_memory(text(out._strm), value)) return insert_elsewhere(out, value, size);
     out._offset += size + 1;
     return out;
 }

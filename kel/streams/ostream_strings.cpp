@@ -15,8 +15,7 @@
 using kel::internal::Escape;
 using kel::internal::escapes;
 using kel::internal::is_cout_or_cerr;
-using kel::internal::is_over_string;
-using kel::internal::is_plain;
+using kel::internal::is_plain_string;
 using kel::internal::plain_run;
 using kel::internal::text;
 using kel::internal::write_bare;
@@ -66,8 +65,8 @@ std::uint32_t write_quoted(std::ostream& out, char c) {
 // is none through the stream, which makes more. What is refused there counts all the same.
 class Quoting {
 public:
-    explicit Quoting(std::ostream& out) : _out(out) { look(); }
-    ~Quoting() { WriteArea::fill(_out, filled()); }
+    explicit Quoting(std::ostream& out) : _out(out), _string(*out.rdbuf()) { look(); }
+    ~Quoting() { WriteArea::fill(_string, filled()); }
     Quoting(const Quoting&) = delete;
     Quoting& operator=(const Quoting&) = delete;
 
@@ -94,21 +93,22 @@ public:
 private:
     // There is no room behind a piece that was refused.
     void look() {
-        _begin = WriteArea::begin(_out);
-        _end = _out.good() ? WriteArea::end(_out) : _begin;
+        _begin = WriteArea::begin(_string);
+        _end = _out.good() ? WriteArea::end(_string) : _begin;
         _at = _begin;
     }
 
     std::size_t filled() const { return static_cast<std::size_t>(_at - _begin); }
 
     void write(const char* text, std::size_t n) {
-        WriteArea::fill(_out, filled());
+        WriteArea::fill(_string, filled());
         _begin = _at;
         _out.write(text, static_cast<std::streamsize>(n));
         look();
     }
 
     std::ostream& _out;
+    std::streambuf& _string;
     std::size_t _count = 0;
     char* _begin;
     char* _at;
@@ -156,7 +156,7 @@ KELostream& KELostream::operator<<(const char* s) {
 
 KELostream& KELostream::putCString(const char* s) {
     std::ostream& out = text(_strm);
-    if (is_plain(out) && is_over_string(out)) {
+    if (is_plain_string(out)) {
         _offset += static_cast<std::uint32_t>(write_quoted_runs(out, s));
         return *this;
     }

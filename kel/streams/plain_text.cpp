@@ -11,14 +11,6 @@
 namespace kel {
 namespace internal {
 
-const void* known_classic;
-
-bool learn_classic(const std::ios_base& stream) {
-    const void* const classic = held_by(std::locale::classic());
-    __atomic_store_n(&known_classic, classic, __ATOMIC_RELAXED);
-    return held_by(stream._M_getloc()) == classic;
-}
-
 // ---- writing ----
 
 namespace {
@@ -34,21 +26,6 @@ char* show(const std::ios_base& stream, char* at, double value) {
 char* show(const std::ios_base&, char* at, char c) {
     *at = c;
     return at + 1;
-}
-
-// Copies `n` characters, 2 to 24, in pieces that overlap.
-void copy_few(char* to, const char* from, std::size_t n) {
-    if (n >= 8) {
-        copy_bytes<8>(to, from);
-        if (n > 16) copy_bytes<8>(to + 8, from + 8);
-        copy_bytes<8>(to + n - 8, from + n - 8);
-    } else if (n >= 4) {
-        copy_bytes<4>(to, from);
-        copy_bytes<4>(to + n - 4, from + n - 4);
-    } else {
-        copy_bytes<2>(to, from);
-        to[n - 1] = from[n - 1];
-    }
 }
 
 // Writes the `n` characters of values and their separators as insertions would, of which the last one writes
@@ -68,20 +45,14 @@ void write_through_buffer(std::ostream& out, const char* text, std::size_t n) {
     out.setstate(state);
 }
 
-// Writes to a stream over a string. Decimals are shown here first, since they spoil what stands behind them.
+// Writes to a stream over a string that has to grow.
 template <class T>
-bool show_and_copy(std::ostream& out, T value) {
+bool show_and_grow(std::ostream& out, T value) {
     KEL_UNINITIALIZED char text[longest_value + 1];
     char* const end = show(out, text, shown(value));
     if (end == nullptr) return false;
     *end = ' ';
-    const std::size_t n = static_cast<std::size_t>(end + 1 - text);
-    if (WriteArea::room(out) >= n) {
-        copy_few(WriteArea::begin(out), text, n);
-        WriteArea::fill(out, n);
-    } else {
-        write_through_buffer(out, text, n);
-    }
+    write_through_buffer(out, text, static_cast<std::size_t>(end + 1 - text));
     return true;
 }
 
@@ -101,7 +72,7 @@ template <class T>
 void write_value(std::ostream& out, T value) {
     if (is_plain(out)) {
         if (is_over_string(out)) {
-            if (show_and_copy(out, value)) return;
+            if (show_and_grow(out, value)) return;
         } else if (!std::is_same_v<T, char> && show_as_one_piece(out, value)) {
             return;
         }
@@ -132,12 +103,13 @@ unsigned int show_between(const std::ios_base& stream, char*& at, const char* en
 // what the string has to grow for.
 template <class T>
 KEL_FLATTEN unsigned int show_values(std::ostream& out, const T* values, unsigned int n) {
-    if (!is_plain(out) || !is_over_string(out)) return 0;
+    if (!is_plain_string(out)) return 0;
     if (!std::is_floating_point_v<T>) {
-        char* const begin = WriteArea::begin(out);
+        std::streambuf& string = *out.rdbuf();
+        char* const begin = WriteArea::begin(string);
         char* at = begin;
-        const unsigned int count = show_between(out, at, WriteArea::end(out), values, n);
-        WriteArea::fill(out, static_cast<std::size_t>(at - begin));
+        const unsigned int count = show_between(out, at, WriteArea::end(string), values, n);
+        WriteArea::fill(string, static_cast<std::size_t>(at - begin));
         if (count > 0) return count;
     }
     KEL_UNINITIALIZED char block[512];
@@ -170,9 +142,10 @@ KEL_FLATTEN void write_bare(std::ostream& out, unsigned long value) {
         out << value;
         return;
     }
-    if (is_over_string(out) && WriteArea::room(out) >= longest_integer) {
-        char* const begin = WriteArea::begin(out);
-        WriteArea::fill(out, static_cast<std::size_t>(show_integer(begin, value) - begin));
+    std::streambuf& buffer = *out.rdbuf();
+    if (is_over_string(out) && WriteArea::room(buffer) >= longest_integer) {
+        char* const begin = WriteArea::begin(buffer);
+        WriteArea::fill(buffer, static_cast<std::size_t>(show_integer(begin, value) - begin));
         return;
     }
     KEL_UNINITIALIZED char text[longest_integer];
@@ -183,9 +156,10 @@ KEL_FLATTEN void write_bare(std::ostream& out, unsigned long value) {
 
 template <class T>
 KEL_FLATTEN unsigned int scan_values(std::istream& in, T* values, unsigned int n) {
-    if (!is_plain(in) || !is_over_string(in)) return 0;
-    const char* const begin = ReadArea::begin(in);
-    KEL_UNINITIALIZED Scan scan(begin, ReadArea::end(in));
+    if (!is_plain_string(in)) return 0;
+    std::streambuf& string = *in.rdbuf();
+    const char* const begin = ReadArea::begin(string);
+    KEL_UNINITIALIZED Scan scan(begin, ReadArea::end(string));
     const char* taken = begin;
     unsigned int count = 0;
     for (; count < n; ++count) {
@@ -193,7 +167,7 @@ KEL_FLATTEN unsigned int scan_values(std::istream& in, T* values, unsigned int n
         if (!scan_next(scan, values[count])) break;
         taken = scan.at();
     }
-    ReadArea::consume(in, taken - begin);
+    ReadArea::consume(string, taken - begin);
     return count;
 }
 

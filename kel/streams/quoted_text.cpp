@@ -91,8 +91,9 @@ private:
 }  // namespace
 
 void read_quoted_text(std::istream& in, QuotedTarget& to) {
-    const char* const begin = ReadArea::begin(in);
-    ReadArea::consume(in, Unquoting(begin, ReadArea::end(in), to).run() - begin);
+    std::streambuf& string = *in.rdbuf();
+    const char* const begin = ReadArea::begin(string);
+    ReadArea::consume(string, Unquoting(begin, ReadArea::end(string), to).run() - begin);
 }
 
 }  // namespace internal

@@ -58,8 +58,12 @@ KEL_BLOCKS __m128i ends_of_quoted_run(__m128i block) {
     return _mm_or_si128(_mm_or_si128(equal(block, '"'), equal(block, '\\')), equal(block, '\n'));
 }
 
-// The run at the beginning of the blocks that `n` characters fill, four of them at once as long as they are
-// all in it. Long strings take an eighth of the time of single characters.
+std::size_t first_of(int places) {
+    return static_cast<std::size_t>(__builtin_ctz(static_cast<unsigned>(places)));
+}
+
+// The run at the beginning of `n` characters, a block at least, in blocks, and four of them at once as long
+// as they are all in it. Long strings take an eighth of the time of single characters.
 template <__m128i ends(__m128i)>
 KEL_BLOCKS std::size_t run_in_blocks(const char* s, std::size_t n) {
     std::size_t i = 0;
@@ -72,9 +76,12 @@ KEL_BLOCKS std::size_t run_in_blocks(const char* s, std::size_t n) {
     }
     for (; n - i >= block_size; i += block_size) {
         const int places = _mm_movemask_epi8(ends(block_at(s + i)));
-        if (places != 0) return i + static_cast<std::size_t>(__builtin_ctz(static_cast<unsigned>(places)));
+        if (places != 0) return i + first_of(places);
     }
-    return i;
+    if (i == n) return n;
+    // The rest lies in a block with characters that are in the run.
+    const int places = _mm_movemask_epi8(ends(block_at(s + n - block_size)));
+    return places == 0 ? n : n - block_size + first_of(places);
 }
 
 // The rest of a run of which the first `i` characters are known.

@@ -283,6 +283,17 @@ TEST(PlainWriting, FlushesTheTiedStreamBeforeEachPiece) {
     EXPECT_NE(flushes(false)[0], '0');
 }
 
+// Moving leaves the new stream the state of the old one and no buffer.
+TEST(PlainWriting, FindsOutThatAGoodStreamHasNoBuffer) {
+    struct Moved : std::ostream {
+        explicit Moved(std::ostream&& from) : std::ostream(std::move(from)) {}
+    };
+    Moved moved(std::ostringstream{});
+    ASSERT_TRUE(moved.good());
+    KELostream(moved) << 1;
+    EXPECT_EQ(moved.rdstate(), std::ios::badbit | std::ios::failbit);
+}
+
 TEST(PlainWriting, FlushesAfterEachPieceWhenTold) {
     const auto flushes = [](bool ordinary) {
         CountingBuffer counting;

@@ -22,30 +22,30 @@ namespace internal {
 
 constexpr int largest_step = std::numeric_limits<int>::max();  // of a buffer's pointers
 
-// Both hold for a stream with a buffer, until the next call of any other function that reads or writes.
+// Both hold until the next call of any other function that reads or writes.
 
 class ReadArea : std::streambuf {
 public:
-    static const char* begin(const std::ios& stream) { return (stream.rdbuf()->*(&ReadArea::gptr))(); }
-    static const char* end(const std::ios& stream) { return (stream.rdbuf()->*(&ReadArea::egptr))(); }
-    static void consume(std::ios& stream, std::ptrdiff_t n) {
-        for (; n > largest_step; n -= largest_step) (stream.rdbuf()->*(&ReadArea::gbump))(largest_step);
-        (stream.rdbuf()->*(&ReadArea::gbump))(static_cast<int>(n));
+    static const char* begin(const std::streambuf& buffer) { return (buffer.*(&ReadArea::gptr))(); }
+    static const char* end(const std::streambuf& buffer) { return (buffer.*(&ReadArea::egptr))(); }
+    static void consume(std::streambuf& buffer, std::ptrdiff_t n) {
+        for (; n > largest_step; n -= largest_step) (buffer.*(&ReadArea::gbump))(largest_step);
+        (buffer.*(&ReadArea::gbump))(static_cast<int>(n));
     }
 };
 
 class WriteArea : std::streambuf {
 public:
-    static char* begin(const std::ios& stream) { return (stream.rdbuf()->*(&WriteArea::pptr))(); }
-    static char* end(const std::ios& stream) { return (stream.rdbuf()->*(&WriteArea::epptr))(); }
-    static std::size_t room(const std::ios& stream) {
-        return static_cast<std::size_t>(end(stream) - begin(stream));
+    static char* begin(const std::streambuf& buffer) { return (buffer.*(&WriteArea::pptr))(); }
+    static char* end(const std::streambuf& buffer) { return (buffer.*(&WriteArea::epptr))(); }
+    static std::size_t room(const std::streambuf& buffer) {
+        return static_cast<std::size_t>(end(buffer) - begin(buffer));
     }
-    static void fill(std::ios& stream, std::size_t n) {
-        for (; n > largest_step; n -= largest_step) fill_few(stream, largest_step);
-        fill_few(stream, static_cast<int>(n));
+    static void fill(std::streambuf& buffer, std::size_t n) {
+        for (; n > largest_step; n -= largest_step) fill_few(buffer, largest_step);
+        fill_few(buffer, static_cast<int>(n));
     }
-    static void fill_few(std::ios& stream, int n) { (stream.rdbuf()->*(&WriteArea::pbump))(n); }
+    static void fill_few(std::streambuf& buffer, int n) { (buffer.*(&WriteArea::pbump))(n); }
 };
 
 // The count of characters that the last unformatted input took.
@@ -56,18 +56,18 @@ public:
 
 // Tells the next character as in.peek() does. For a stream over a string with nothing tied to it.
 inline int peek(std::istream& in) {
-    const char* const at = ReadArea::begin(in);
-    if (!in.good() || at == ReadArea::end(in)) return in.peek();
+    const char* const at = ReadArea::begin(*in.rdbuf());
+    if (!in.good() || at == ReadArea::end(*in.rdbuf())) return in.peek();
     InputCount::set(in, 0);
     return static_cast<unsigned char>(*at);
 }
 
 // Consumes the next character as in.get() does. For a stream over a string that throws nothing.
 inline int take(std::istream& in) {
-    const char* const at = ReadArea::begin(in);
-    if (!in.good() || at == ReadArea::end(in)) return in.get();
+    const char* const at = ReadArea::begin(*in.rdbuf());
+    if (!in.good() || at == ReadArea::end(*in.rdbuf())) return in.get();
     const int c = static_cast<unsigned char>(*at);
-    ReadArea::consume(in, 1);
+    ReadArea::consume(*in.rdbuf(), 1);
     InputCount::set(in, 1);
     return c;
 }

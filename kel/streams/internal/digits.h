@@ -3,11 +3,13 @@
 //     char room[longest_integer];
 //     char* const end = show_integer(room, -4711);
 //
-// Digits are looked up two at a time, or made four at a time in one word where it matters how many they are.
+// Digits are looked up two at a time, and put together in one word where it matters how many they are.
 //
 // SPDX-License-Identifier: MIT
 #ifndef KEL_STREAMS_INTERNAL_DIGITS_H
 #define KEL_STREAMS_INTERNAL_DIGITS_H
+
+#include <kel/core/internal/attributes.h>
 
 #include <cstdint>
 #include <type_traits>
@@ -23,17 +25,6 @@ template <int n>
 void copy_bytes(void* to, const void* from) {
     __builtin_memcpy(to, from, n);
 }
-
-// The digits of a number below 10,000 as the bytes of a word, the first one lowest. Two numbers below 100
-// lie in the halves of a word; 103 / 1024 is close enough to a tenth for them.
-inline std::uint32_t four_digits(std::uint32_t n) {
-    const std::uint32_t hundreds = n * 5243 >> 19;
-    const std::uint32_t halves = hundreds | (n - hundreds * 100) << 16;
-    const std::uint32_t tens = halves * 103 >> 10 & 0x000f000f;
-    return tens + ((halves - tens * 10) << 8);
-}
-
-constexpr std::uint32_t four_zeros = 0x30303030;
 
 // The numbers below 100 as two characters each.
 struct Pairs {
@@ -73,10 +64,16 @@ inline void put_eight(char* at, std::uint32_t n) {
 // The digits of a number below 10,000 without leading zeros, the first one lowest, and how many they are.
 struct UpToFour {
     explicit UpToFour(std::uint32_t n) {
-        const std::uint32_t digits = four_digits(n);
-        const int zeros = __builtin_ctz(digits | 1 << 24) / 8;
-        characters = (digits + four_zeros) >> 8 * zeros;
+        const std::uint32_t hundreds = n * 5243 >> 19;
+        characters = pair(hundreds) | pair(n - hundreds * 100) << 16;
+        const int zeros = __builtin_ctz((characters & 0x000f0f0f) | 1 << 24) / 8;
+        characters >>= 8 * zeros;
         count = 4 - zeros;
+    }
+    static std::uint32_t pair(std::uint32_t n) {
+        KEL_UNINITIALIZED std::uint16_t both;
+        copy_bytes<2>(&both, pairs.characters[n]);
+        return both;
     }
     std::uint32_t characters;
     int count;
@@ -120,11 +117,29 @@ inline std::uint64_t high_product(std::uint64_t a, std::uint64_t b) {
     return a1 * b1 + (cross >> 32) + (other >> 32);
 }
 
-// n / 100,000,000 for any n: by the reciprocal 2^90 / 10^8, rounded up, because a 32-bit processor takes
-// longer for one division of 64 bits than for all digits.
-inline std::uint64_t without_eight_digits(std::uint64_t n) {
-    return high_product(n, 0xabcc77118461cefdu) >> 26;
-}
+constexpr std::uint32_t eight_digits = 100000000;  // the first number of nine
+
+// A number in parts of eight digits, the last one apart: what stands before it, and it.
+struct LastEight {
+    explicit LastEight(std::uint64_t n) {
+#ifdef __i386__
+        // Two divisions of what one instruction divides; for all 64 bits at once the compiler calls a
+        // function.
+        const std::uint32_t upper = static_cast<std::uint32_t>(n >> 32);
+        std::uint32_t quotient;
+        __asm__("divl %[by]"
+                : "=a"(quotient), "=d"(last)
+                : "a"(static_cast<std::uint32_t>(n)), "d"(upper % eight_digits), [by] "r"(eight_digits)
+                : "cc");
+        first = std::uint64_t(upper / eight_digits) << 32 | quotient;
+#else
+        first = n / eight_digits;
+        last = static_cast<std::uint32_t>(n % eight_digits);
+#endif
+    }
+    std::uint64_t first;
+    std::uint32_t last;
+};
 
 // Each of these gives the end of the text, and changes nothing behind it.
 inline char* show_integer(char* at, std::uint32_t n) {
@@ -141,17 +156,16 @@ inline char* show_integer(char* at, std::uint32_t n) {
 
 inline char* show_integer(char* at, std::uint64_t n) {
     if (n <= 0xffffffffu) return show_integer(at, static_cast<std::uint32_t>(n));
-    const std::uint64_t upper = without_eight_digits(n);
-    std::uint32_t uppermost = static_cast<std::uint32_t>(upper);
-    if (upper > 0xffffffffu) {
-        uppermost = static_cast<std::uint32_t>(upper >> 8) / (100000000 >> 8);  // upper has less than 40 bits
-        at = show_integer(at, uppermost);
-        put_eight(at, static_cast<std::uint32_t>(upper - uppermost * std::uint64_t(100000000)));
-        at += 8;
+    KEL_UNINITIALIZED const LastEight ends(n);
+    if (ends.first <= 0xffffffffu) {
+        at = show_integer(at, static_cast<std::uint32_t>(ends.first));
     } else {
-        at = show_integer(at, uppermost);
+        KEL_UNINITIALIZED const LastEight middle(ends.first);
+        at = show_integer(at, static_cast<std::uint32_t>(middle.first));
+        put_eight(at, middle.last);
+        at += 8;
     }
-    put_eight(at, static_cast<std::uint32_t>(n - upper * 100000000));
+    put_eight(at, ends.last);
     return at + 8;
 }
 

@@ -22,6 +22,7 @@ public:
     Scan(const char* begin, const char* end) : _at(begin), _end(end) {}
 
     const char* at() const { return _at; }
+    const char* end() const { return _end; }
     bool at_end() const { return _at == _end; }
     bool is(char c) const { return _at != _end && *_at == c; }
 
@@ -44,18 +45,33 @@ public:
     }
 
     // The value of the digit that comes next; any other character, and none, gives 10 or more.
-    unsigned digit() const { return _at != _end ? static_cast<unsigned>(*_at) - '0' : 10; }
+    unsigned digit() const { return _at != _end ? digit_at(0) : 10; }
 
-    // The digits that come next, at most `most` of them, behind those that `number` has; gives how many.
-    int append_digits(int most, std::uint32_t& number) {
-        const char* const begin = _at;
-        const char* const stop = _end - _at > most ? _at + most : _end;
-        for (unsigned digit; _at != stop && (digit = static_cast<unsigned>(*_at) - '0') < 10; ++_at)
-            number = number * 10 + digit;
-        return static_cast<int>(_at - begin);
+    // The number of the digits that come next, at most `most` of them; gives how many they are. Where there
+    // is room for all of them their steps are laid out in a row: counting and comparing took a third of the
+    // time.
+    template <int most>
+    int read_digits(std::uint32_t& number) {
+        number = 0;
+        const int room = _end - _at < most ? static_cast<int>(_end - _at) : most;
+        int n = 0;
+        if (room == most) {
+#pragma GCC unroll 9
+            for (; n != most; ++n) {
+                const unsigned digit = digit_at(n);
+                if (digit >= 10) break;
+                number = number * 10 + digit;
+            }
+        } else {
+            for (unsigned digit; n != room && (digit = digit_at(n)) < 10; ++n) number = number * 10 + digit;
+        }
+        _at += n;
+        return n;
     }
 
 private:
+    unsigned digit_at(int i) const { return static_cast<unsigned>(_at[i]) - '0'; }
+
     const char* _at;
     const char* const _end;
 };
@@ -64,7 +80,7 @@ private:
 struct FewDigits {
     static constexpr int most = 9;
 
-    explicit FewDigits(Scan& scan) : number(0), count(scan.append_digits(most, number)) {}
+    explicit FewDigits(Scan& scan) : count(scan.read_digits<most>(number)) {}
 
     std::uint32_t number;
     int count;
@@ -100,19 +116,22 @@ std::uint64_t largest(bool negative) {
     return std::is_signed_v<T> ? positive + 1 : 0;
 }
 
-// Each gives the value, or false for a number of the ordinary way. The scan has then gone anywhere.
-// A number with more digits than always fit, of which `number` has the first ones: some do.
+// The end of a number with more digits than always fit, of which `number` has the first ones: some do. Null
+// for a number of the ordinary way. It is handed no scan, for one without an address stays in registers.
 template <class T>
-[[gnu::noinline]] bool scan_rest(Scan& scan, bool negative, std::uint64_t number, T& value) {
-    for (; scan.digit() < 10; scan.advance()) {
-        if (__builtin_mul_overflow(number, 10u, &number)) return false;
-        if (__builtin_add_overflow(number, scan.digit(), &number)) return false;
+[[gnu::noinline]] const char* scan_rest(const char* at, const char* end, bool negative, std::uint64_t number,
+                                        T& value) {
+    Scan rest(at, end);
+    for (; rest.digit() < 10; rest.advance()) {
+        if (__builtin_mul_overflow(number, 10u, &number)) return nullptr;
+        if (__builtin_add_overflow(number, rest.digit(), &number)) return nullptr;
     }
-    if (scan.at_end() || number > largest<T>(negative)) return false;
+    if (rest.at_end() || number > largest<T>(negative)) return nullptr;
     value = static_cast<T>(negative ? 0 - number : number);
-    return true;
+    return rest.at();
 }
 
+// Each gives the value, or false for a number of the ordinary way. The scan has then gone anywhere.
 template <class T>
 std::enable_if_t<std::is_integral_v<T>, bool> scan_number(Scan& scan, T& value) {
     const bool negative = std::is_signed_v<T> && scan.accept('-');
@@ -120,10 +139,9 @@ std::enable_if_t<std::is_integral_v<T>, bool> scan_number(Scan& scan, T& value) 
     if (scan.at_end() || first.count == 0) return false;
     // So many digits fit into 32 and into 64 bits.
     if (sizeof(T) < 4 || scan.digit() < 10) {
-        Scan rest = scan;  // has an address, which the scan of all others need not have
-        const bool found = scan_rest(rest, negative, first.number, value);
-        scan.go_on_at(rest.at());
-        return found;
+        const char* const behind = scan_rest(scan.at(), scan.end(), negative, first.number, value);
+        scan.go_on_at(behind);
+        return behind != nullptr;
     }
     value = static_cast<T>(negative ? 0 - first.number : first.number);
     return true;

@@ -13,6 +13,7 @@
 
 #include <kel/core/internal/attributes.h>
 #include <kel/streams/internal/areas.h>
+#include <kel/streams/internal/decimals.h>
 #include <kel/streams/internal/digits.h>
 #include <kel/streams/internal/plain.h>
 #include <kel/streams/internal/scan.h>
@@ -26,30 +27,58 @@ static_assert(longest_decimal <= longest_value, "both kinds of numbers have room
 
 template <class T>
 bool show_in_memory(std::ostream& out, T value) {
-    std::ios& stream = out;
-    if (!is_plain(stream) || !is_over_string(stream) || WriteArea::room(stream) <= longest_value)
-        return false;
-    char* const begin = WriteArea::begin(stream);
+    if (!is_plain_string(out)) return false;
+    std::streambuf& string = *out.rdbuf();
+    if (WriteArea::room(string) <= longest_value) return false;
+    char* const begin = WriteArea::begin(string);
     char* const end = show_integer(begin, shown(value));
     *end = ' ';
-    WriteArea::fill_few(stream, static_cast<int>(end + 1 - begin));
+    WriteArea::fill_few(string, static_cast<int>(end + 1 - begin));
     return true;
 }
 
 // A character is no number.
 inline bool show_in_memory(std::ostream& out, char c) {
-    std::ios& stream = out;
-    if (!is_plain(stream) || !is_over_string(stream) || WriteArea::room(stream) < 2) return false;
-    char* const at = WriteArea::begin(stream);
+    if (!is_plain_string(out)) return false;
+    std::streambuf& string = *out.rdbuf();
+    if (WriteArea::room(string) < 2) return false;
+    char* const at = WriteArea::begin(string);
     at[0] = c;
     at[1] = ' ';
-    WriteArea::fill_few(stream, 2);
+    WriteArea::fill_few(string, 2);
     return true;
 }
 
-// Decimals spoil what stands behind them while they are shown, and go through other memory.
-inline bool show_in_memory(std::ostream&, double) { return false; }
-inline bool show_in_memory(std::ostream&, float) { return false; }
+// Copies the `n` characters of a decimal, 2 to 16, in pieces that overlap.
+inline void copy_few(char* to, const char* from, std::size_t n) {
+    if (n >= 8) {
+        copy_bytes<8>(to, from);
+        copy_bytes<8>(to + n - 8, from + n - 8);
+    } else if (n >= 4) {
+        copy_bytes<4>(to, from);
+        copy_bytes<4>(to + n - 4, from + n - 4);
+    } else {
+        copy_bytes<2>(to, from);
+        to[n - 1] = from[n - 1];
+    }
+}
+
+// A decimal spoils what stands behind it while it is shown, and goes through other memory.
+inline bool show_in_memory(std::ostream& out, double value) {
+    if (!is_plain_string(out) || !has_plain_precision(out)) return false;
+    KEL_UNINITIALIZED char text[longest_decimal + 1];
+    char* const end = show_decimal(text, value);
+    if (end == nullptr) return false;
+    *end = ' ';
+    std::streambuf& string = *out.rdbuf();
+    const std::size_t n = static_cast<std::size_t>(end + 1 - text);
+    if (WriteArea::room(string) < n) return false;
+    copy_few(WriteArea::begin(string), text, n);
+    WriteArea::fill_few(string, static_cast<int>(n));
+    return true;
+}
+
+inline bool show_in_memory(std::ostream& out, float value) { return show_in_memory(out, shown(value)); }
 
 template <class T>
 bool scan_next(Scan& scan, T& value) {
@@ -75,13 +104,13 @@ inline bool scan_next(Scan& scan, char& c) {
 // A value and `behind` characters after it, one or none.
 template <int behind, class T>
 bool scan_in_memory(std::istream& in, T& value) {
-    std::ios& stream = in;
-    if (!is_plain(stream) || !is_over_string(stream)) return false;
-    const char* const begin = ReadArea::begin(stream);
-    KEL_UNINITIALIZED Scan scan(begin, ReadArea::end(stream));
+    if (!is_plain_string(in)) return false;
+    std::streambuf& string = *in.rdbuf();
+    const char* const begin = ReadArea::begin(string);
+    KEL_UNINITIALIZED Scan scan(begin, ReadArea::end(string));
     scan.skip_blanks();
     if (!scan_next(scan, value)) return false;
-    ReadArea::consume(stream, scan.at() + behind - begin);
+    ReadArea::consume(string, scan.at() + behind - begin);
     if (behind > 0) InputCount::set(in, behind);
     return true;
 }
