@@ -1,10 +1,12 @@
 // SPDX-License-Identifier: MIT
 #include <kel/containers/strings.h>
+#include <kel/core/internal/attributes.h>
 #include <kel/streams/internal/areas.h>
 #include <kel/streams/internal/console.h>
 #include <kel/streams/internal/escapes.h>
 #include <kel/streams/internal/plain.h>
 #include <kel/streams/internal/quoted_text.h>
+#include <kel/streams/internal/runs.h>
 #include <kel/streams/internal/short_way.h>
 #include <kel/streams/internal/text.h>
 #include <kel/streams/istream.h>
@@ -18,6 +20,7 @@
 using kel::internal::error_stream;
 using kel::internal::Escape;
 using kel::internal::escapes;
+using kel::internal::InputCount;
 using kel::internal::is_cin;
 using kel::internal::is_plain_string;
 using kel::internal::QuotedTarget;
@@ -62,6 +65,25 @@ private:
     std::istream& _in;
     const bool _in_memory;
 };
+
+// A string without escapes that lies in memory from its opening quote to the character behind its closing
+// one, as most do. Gives how many characters it has; -1, and nothing is read, for any other and where there
+// is no room for it and its terminator.
+std::int64_t take_whole_string(std::istream& in, char* buf, std::uint32_t room) {
+    std::streambuf& string = *in.rdbuf();
+    const char* const begin = ReadArea::begin(string);
+    const std::ptrdiff_t there = ReadArea::end(string) - begin;
+    if (there < 3 || *begin != '"') return -1;
+    const char* const contents = begin + 1;
+    const std::size_t most = std::min<std::size_t>(static_cast<std::size_t>(there) - 2, room);
+    const std::size_t n = kel::internal::quoted_run(contents, most);
+    if (n == most || contents[n] != '"') return -1;
+    std::memcpy(buf, contents, n);
+    buf[n] = '\0';
+    ReadArea::consume(string, static_cast<std::ptrdiff_t>(n) + 3);
+    InputCount::set(in, 1);
+    return static_cast<std::int64_t>(n);
+}
 
 // Consumes the opening quote if it comes next, as it does where the writer has been.
 bool take_quote(std::istream& in) {
@@ -150,6 +172,42 @@ char read_escape(std::istream& in, std::uint32_t& offset) {
 // Whether a character inside the quotes will be stored, by itself or with its escape.
 bool takes_room(int c) { return c != '"' && c != '\n' && c != end_of_input; }
 
+// A quoted string of any kind, character by character where it has to be.
+[[gnu::noinline]] void read_quoted(std::istream& in, QuotedTarget to) {
+    Characters characters(in);
+    const bool quoted = (characters.in_memory() && take_quote(in)) || read_opening_quote(in);
+    to.offset += 1;
+    if (!quoted) return;
+
+    for (;;) {
+        if (characters.in_memory() && in.good()) read_quoted_text(in, to);
+        if (to.room == 0 && takes_room(characters.peek())) {  // and stays unread
+            to.offset += 1;
+            report_overflow();
+            return;
+        }
+        const int c = characters.take();
+        if (c == '"') {
+            if (to.room == 0) return;
+            break;
+        }
+        if (c == end_of_input) {
+            // Every further read would give the same, up to the overflow.
+            std::fill_n(to.buf, to.room, '\xff');
+            to.offset += to.room + 1;
+            report_overflow();
+            return;
+        }
+        to.offset += 1;
+        if (c == '\n') continue;
+        --to.room;
+        *to.buf++ = c == '\\' ? read_escape(in, to.offset) : static_cast<char>(c);
+    }
+    *to.buf = '\0';
+    characters.take();
+    to.offset += 1;
+}
+
 // Reads a quoted string into a new one. What a stream throws leaves that empty: nobody could tell what has
 // been stored from what its memory held before.
 void read_into(KEListream& in, char* s, std::uint32_t length) {
@@ -173,7 +231,7 @@ void read_word(std::istream& in, char* s, std::uint32_t& offset) {
 
 }  // namespace
 
-KEListream& KEListream::operator>>(char*& s) {
+KEL_FLATTEN KEListream& KEListream::operator>>(char*& s) {
     std::istream& in = text(_strm);
     if (is_cin(&in)) {
         read_word(in, s, _offset);
@@ -213,41 +271,14 @@ KEListream& KEListream::operator>>(char*& s) {
     return *this;
 }
 
-KEListream& KEListream::getCString(char* buf, unsigned int len) {
+KEL_FLATTEN KEListream& KEListream::getCString(char* buf, unsigned int len) {
     std::istream& in = text(_strm);
-    Characters characters(in);
-    const bool quoted = (characters.in_memory() && take_quote(in)) || read_opening_quote(in);
-    _offset += 1;
-    if (!quoted) return *this;
-
-    QuotedTarget to = {buf, len, _offset};
-    for (;;) {
-        if (characters.in_memory() && in.good()) read_quoted_text(in, to);
-        if (to.room == 0 && takes_room(characters.peek())) {  // and stays unread
-            _offset += 1;
-            report_overflow();
-            return *this;
-        }
-        const int c = characters.take();
-        if (c == '"') {
-            if (to.room == 0) return *this;
-            break;
-        }
-        if (c == end_of_input) {
-            // Every further read would give the same, up to the overflow.
-            std::fill_n(to.buf, to.room, '\xff');
-            _offset += to.room + 1;
-            report_overflow();
-            return *this;
-        }
-        _offset += 1;
-        if (c == '\n') continue;
-        --to.room;
-        *to.buf++ = c == '\\' ? read_escape(in, _offset) : static_cast<char>(c);
+    const std::int64_t n = is_plain_string(in) ? take_whole_string(in, buf, len) : -1;
+    if (n < 0) {
+        read_quoted(in, {buf, len, _offset});
+    } else {
+        _offset += static_cast<std::uint32_t>(n) + 2;
     }
-    *to.buf = '\0';
-    characters.take();
-    _offset += 1;
     return *this;
 }
 
