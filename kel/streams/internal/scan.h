@@ -116,11 +116,25 @@ std::uint64_t largest(bool negative) {
     return std::is_signed_v<T> ? positive + 1 : 0;
 }
 
-// The end of a number with more digits than always fit, of which `number` has the first ones: some do. Null
-// for a number of the ordinary way. It is handed no scan, for one without an address stays in registers.
+// Each gives the value, or false for a number of the ordinary way. The scan has then gone anywhere.
+// A number that may be too large, of which `number` has the first digits, as many as always fit: one digit
+// more where they are nine. With more still it is too large or begins with zeros.
 template <class T>
-[[gnu::noinline]] const char* scan_rest(const char* at, const char* end, bool negative, std::uint64_t number,
-                                        T& value) {
+std::enable_if_t<sizeof(T) <= 4, bool> scan_rest(Scan& scan, bool negative, std::uint64_t number, T& value) {
+    if (scan.digit() < 10) {
+        number = number * 10 + scan.digit();
+        scan.advance();
+    }
+    if (scan.at_end() || scan.digit() < 10 || number > largest<T>(negative)) return false;
+    value = static_cast<T>(negative ? 0 - number : number);
+    return true;
+}
+
+// Where they are eighteen, two digits more, and by a function of its own. It gives the end of the number and
+// is handed no scan, for one without an address stays in registers.
+template <class T>
+[[gnu::noinline]] const char* scan_last_digits(const char* at, const char* end, bool negative,
+                                               std::uint64_t number, T& value) {
     Scan rest(at, end);
     for (; rest.digit() < 10; rest.advance()) {
         if (__builtin_mul_overflow(number, 10u, &number)) return nullptr;
@@ -131,18 +145,20 @@ template <class T>
     return rest.at();
 }
 
-// Each gives the value, or false for a number of the ordinary way. The scan has then gone anywhere.
+template <class T>
+std::enable_if_t<sizeof(T) == 8, bool> scan_rest(Scan& scan, bool negative, std::uint64_t number, T& value) {
+    const char* const behind = scan_last_digits(scan.at(), scan.end(), negative, number, value);
+    scan.go_on_at(behind);
+    return behind != nullptr;
+}
+
 template <class T>
 std::enable_if_t<std::is_integral_v<T>, bool> scan_number(Scan& scan, T& value) {
     const bool negative = std::is_signed_v<T> && scan.accept('-');
     KEL_UNINITIALIZED const std::conditional_t<sizeof(T) <= 4, FewDigits, Digits> first(scan);
     if (scan.at_end() || first.count == 0) return false;
     // So many digits fit into 32 and into 64 bits.
-    if (sizeof(T) < 4 || scan.digit() < 10) {
-        const char* const behind = scan_rest(scan.at(), scan.end(), negative, first.number, value);
-        scan.go_on_at(behind);
-        return behind != nullptr;
-    }
+    if (sizeof(T) < 4 || scan.digit() < 10) return scan_rest(scan, negative, first.number, value);
     value = static_cast<T>(negative ? 0 - first.number : first.number);
     return true;
 }
