@@ -80,43 +80,77 @@ constexpr int shown_digits = 6;
 constexpr std::uint32_t smallest_shown = 100000;   // of six digits
 constexpr std::uint32_t smallest_above = 1000000;  // of seven
 
-// Copies of a fixed length are single moves, and what they bring too much is written over or left out.
-char* put_digits(char* at, const char* digits, int n) {
-    copy_bytes<shown_digits>(at, digits);
-    return at + n;
+// One to seven characters, the first one lowest. They are put together in a word and stored from there in two
+// pieces that overlap: loading what was stored in other pieces just before takes as long as all digits.
+struct FewCharacters {
+    char* put(char* at) const {
+        if (count >= 4) {
+            store<4>(at, 0);
+            store<4>(at + count - 4, count - 4);
+        } else if (count >= 2) {
+            store<2>(at, 0);
+            store<2>(at + count - 2, count - 2);
+        } else {
+            *at = static_cast<char>(word);
+        }
+        return at + count;
+    }
+
+    // `n` of them from the one with the number `first` on, which is three at most.
+    template <int n>
+    void store(char* at, int first) const {
+        const std::uint32_t part = static_cast<std::uint32_t>(word >> (8 * first & 31));
+        copy_bytes<n>(at, &part);
+    }
+
+    std::uint64_t word;
+    int count;
+};
+
+// Six digits without the zeros at the end.
+FewCharacters significant_digits(std::uint32_t six) {
+    // The digits come out of a fraction in front of its point, as in put_eight.
+    const std::uint64_t first = std::uint64_t(six) * 429497;  // 2^32 / 10^4, rounded up
+    const std::uint64_t second = (first & 0xffffffff) * 100;
+    const std::uint64_t third = (second & 0xffffffff) * 100;
+    const std::uint32_t four = pair_of_digits(first >> 32) | pair_of_digits(second >> 32) << 16;
+    const std::uint32_t two = pair_of_digits(third >> 32);
+    const std::uint64_t word = std::uint64_t(two) << 32 | four;
+    return {word, 8 - __builtin_clzll(word & 0x0f0f0f0f0f0f) / 8};
 }
 
-char* put_fraction(char* at, const char* digits, int n) {
-    if (n <= 0) return at;
-    *at = '.';
-    return put_digits(at + 1, digits, n);
+// The same with a point behind the first `before` digits, where others follow; with zeros up to there
+// otherwise.
+FewCharacters with_point(FewCharacters digits, int before) {
+    if (digits.count <= before) return {digits.word, before};
+    const std::uint64_t fraction = ~std::uint64_t(0) << 8 * before;
+    const std::uint64_t point = std::uint64_t('.') << 8 * before;
+    return {(digits.word & ~fraction) | point | (digits.word & fraction) << 8, digits.count + 1};
+}
+
+// "0.", and more zeros: two to five characters. One character more may be spoilt behind two.
+char* put_zeros(char* at, int count) {
+    at[2] = at[count - 2] = at[count - 1] = '0';
+    copy_bytes<2>(at, "0.");
+    return at + count;
 }
 
 char* put_exponent(char* at, int exponent) {
-    const int size = exponent < 0 ? -exponent : exponent;
-    at[0] = 'e';
-    at[1] = exponent < 0 ? '-' : '+';
-    at[2] = static_cast<char>('0' + size / 10);
-    at[3] = static_cast<char>('0' + size % 10);
+    const std::uint32_t size = static_cast<std::uint32_t>(exponent < 0 ? -exponent : exponent);
+    const std::uint32_t sign = exponent < 0 ? '-' : '+';
+    const std::uint32_t word = 'e' | sign << 8 | pair_of_digits(size) << 16;
+    copy_bytes<4>(at, &word);
     return at + 4;
 }
 
 // Six digits of which the first stands for 10^exponent, as "%g" shows them: without zeros at the end,
 // and with an exponent only below -4 and from 6 on.
 char* put_general(char* at, std::uint32_t six, int exponent) {
-    KEL_UNINITIALIZED char eight[2 + 2 * shown_digits];
-    put_eight(eight, six);
-    const char* const digits = eight + 2;
-    int n = shown_digits;
-    while (digits[n - 1] == '0') --n;
-
-    if (exponent < -4 || exponent >= shown_digits) {
-        *at = digits[0];
-        return put_exponent(put_fraction(at + 1, digits + 1, n - 1), exponent);
-    }
-    if (exponent < 0) return put_digits(put_digits(at, "0.0000", 1 - exponent), digits, n);
-    put_digits(at, digits, shown_digits);
-    return put_fraction(at + exponent + 1, digits + exponent + 1, n - exponent - 1);
+    const FewCharacters digits = significant_digits(six);
+    if (exponent < -4 || exponent >= shown_digits)
+        return put_exponent(with_point(digits, 1).put(at), exponent);
+    if (exponent < 0) return digits.put(put_zeros(at, 1 - exponent));
+    return with_point(digits, exponent + 1).put(at);
 }
 
 // The six digits of the number with the given first 64 bits, the first of them set, and the exponent of
@@ -173,11 +207,12 @@ bool nearest(bool negative, std::uint64_t digits, int exponent, Float& value) {
 char* show_decimal(char* at, double value) {
     std::uint64_t bits;
     std::memcpy(&bits, &value, sizeof bits);
-    if (bits >> 63 != 0) *at++ = '-';
+    const int negative = static_cast<int>(bits >> 63);
     bits <<= 1;
     if (bits == 0) {
-        *at = '0';
-        return at + 1;
+        *at = '-';
+        at[negative] = '0';
+        return at + negative + 1;
     }
     const int stored_exponent = static_cast<int>(bits >> 53);
     if (stored_exponent == 0 || !rounds_to_nearest())
@@ -186,7 +221,8 @@ char* show_decimal(char* at, double value) {
     int exponent;
     const std::uint64_t significand = bits << 10 | std::uint64_t(1) << 63;
     if (!six_digits(significand, stored_exponent - 1023, six, exponent)) return nullptr;
-    return put_general(at, six, exponent);
+    *at = '-';
+    return put_general(at + negative, six, exponent);
 }
 
 bool decimal_value(bool negative, std::uint64_t digits, int exponent, double& value) {

@@ -15,19 +15,6 @@ namespace internal {
 
 namespace {
 
-// Each gives the end of the text without its separator; null when only the inserter knows it.
-template <class T>
-char* show(const std::ios_base&, char* at, T value) {
-    return show_integer(at, value);
-}
-char* show(const std::ios_base& stream, char* at, double value) {
-    return has_plain_precision(stream) ? show_decimal(at, value) : nullptr;
-}
-char* show(const std::ios_base&, char* at, char c) {
-    *at = c;
-    return at + 1;
-}
-
 // Writes the `n` characters of values and their separators as insertions would, of which the last one writes
 // the last separator: when one fails, those behind it are refused, and that sets failbit too.
 void write_through_buffer(std::ostream& out, const char* text, std::size_t n) {
@@ -90,7 +77,7 @@ unsigned int show_between(const std::ios_base& stream, char*& at, const char* en
     unsigned int count = 0;
     for (; count < n && end - at > static_cast<std::ptrdiff_t>(longest_value); ++count) {
         char* const value_end = show(stream, at, shown(values[count]));
-        if (value_end == nullptr) break;
+        if (std::is_floating_point_v<T> && value_end == nullptr) break;
         *value_end = ' ';
         at = value_end + 1;
     }
@@ -99,22 +86,21 @@ unsigned int show_between(const std::ios_base& stream, char*& at, const char* en
 
 }  // namespace
 
-// Straight into the memory of the string while there is room in it. Decimals go through a block, and so does
-// what the string has to grow for.
+// Straight into the memory of the string while there is room in it; what the string has to grow for goes
+// through a block.
 template <class T>
 KEL_FLATTEN unsigned int show_values(std::ostream& out, const T* values, unsigned int n) {
     if (!is_plain_string(out)) return 0;
-    if (!std::is_floating_point_v<T>) {
-        std::streambuf& string = *out.rdbuf();
-        char* const begin = WriteArea::begin(string);
-        char* at = begin;
-        const unsigned int count = show_between(out, at, WriteArea::end(string), values, n);
-        WriteArea::fill(string, static_cast<std::size_t>(at - begin));
-        if (count > 0) return count;
-    }
+    std::streambuf& string = *out.rdbuf();
+    char* const begin = WriteArea::begin(string);
+    char* at = begin;
+    unsigned int count = show_between(out, at, WriteArea::end(string), values, n);
+    WriteArea::fill(string, static_cast<std::size_t>(at - begin));
+    if (count > 0) return count;
+
     KEL_UNINITIALIZED char block[512];
-    char* at = block;
-    const unsigned int count = show_between(out, at, block + sizeof block, values, n);
+    at = block;
+    count = show_between(out, at, block + sizeof block, values, n);
     if (count > 0) write_through_buffer(out, block, static_cast<std::size_t>(at - block));
     return count;
 }

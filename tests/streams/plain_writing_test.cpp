@@ -206,6 +206,9 @@ TEST(PlainWriting, ChangesNothingBehindWhatItOverwrites) {
     for (const char* s : {"", "s", "a longer string", "\x01\""}) {
         same_writing([&](KELostream& out) { out << 'c' << s; }, in_the_middle);
     }
+    const double few[] = {1, 0.5, 1e-5};
+    const long many[] = {1, -20000, 2000000000};
+    same_writing([&](KELostream& out) { out.put(few, 3u).put(many, 3u); }, in_the_middle);
 }
 
 TEST(PlainWriting, ShowsTheTextsThatAreKnown) {

@@ -13,9 +13,10 @@
 namespace kel {
 namespace internal {
 
-constexpr int longest_decimal = 16;  // room that show_decimal needs; the longest text is -1.23456e-22
+constexpr int longest_decimal = 12;  // -1.23456e-22
 
-// The text of "%.6g", and its end; null for a number of the ordinary way.
+// The text of "%.6g" and its end, behind which nothing is changed. Null, and no text, for a number of the
+// ordinary way.
 char* show_decimal(char* at, double value);
 
 // `digits` * 10^`exponent`, rounded to nearest, or what is as far below 0. False, and no value, for a number

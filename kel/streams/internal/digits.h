@@ -38,6 +38,13 @@ struct Pairs {
 };
 constexpr Pairs pairs;
 
+// Both characters of a number below 100, the first one lower.
+inline std::uint32_t pair_of_digits(std::uint64_t n) {
+    KEL_UNINITIALIZED std::uint16_t both;
+    copy_bytes<2>(&both, pairs.characters[n]);
+    return both;
+}
+
 // A fraction in units of 2^-32, of which the digits come out two at a time in front of the point: one
 // multiplication leaves them in one half of its result and the rest of the fraction in the other.
 inline std::uint32_t put_pair(char* at, std::uint32_t fraction) {
@@ -65,15 +72,10 @@ inline void put_eight(char* at, std::uint32_t n) {
 struct UpToFour {
     explicit UpToFour(std::uint32_t n) {
         const std::uint32_t hundreds = n * 5243 >> 19;
-        characters = pair(hundreds) | pair(n - hundreds * 100) << 16;
+        characters = pair_of_digits(hundreds) | pair_of_digits(n - hundreds * 100) << 16;
         const int zeros = __builtin_ctz((characters & 0x000f0f0f) | 1 << 24) / 8;
         characters >>= 8 * zeros;
         count = 4 - zeros;
-    }
-    static std::uint32_t pair(std::uint32_t n) {
-        KEL_UNINITIALIZED std::uint16_t both;
-        copy_bytes<2>(&both, pairs.characters[n]);
-        return both;
     }
     std::uint32_t characters;
     int count;

@@ -45,8 +45,8 @@ inline bool has_classic_locale(const std::ios_base& stream) {
 // tenth of the time of a number. Only a stream that another one was moved into is good without a buffer.
 inline bool is_plain(const std::ios& stream) {
     const std::ios_base::fmtflags born_with = std::ios_base::skipws | std::ios_base::dec;
-    const int state = stream.rdstate() | stream.exceptions() | (stream.flags() ^ born_with);
-    const std::uintptr_t unusual = static_cast<std::uintptr_t>(state) |
+    const std::uintptr_t unusual = static_cast<std::uintptr_t>(stream.rdstate() | stream.exceptions()) |
+                                   static_cast<std::uintptr_t>(stream.flags() ^ born_with) |
                                    static_cast<std::uintptr_t>(stream.width()) |
                                    reinterpret_cast<std::uintptr_t>(stream.tie());
     return unusual == 0 && has_classic_locale(stream) && stream.rdbuf() != nullptr;

@@ -25,60 +25,31 @@ namespace internal {
 constexpr std::size_t longest_value = longest_integer;
 static_assert(longest_decimal <= longest_value, "both kinds of numbers have room");
 
+// Each gives the end of the text without its separator; null when only the inserter knows it.
+template <class T>
+char* show(const std::ios_base&, char* at, T value) {
+    return show_integer(at, value);
+}
+inline char* show(const std::ios_base& stream, char* at, double value) {
+    return has_plain_precision(stream) ? show_decimal(at, value) : nullptr;
+}
+inline char* show(const std::ios_base&, char* at, char c) {
+    *at = c;
+    return at + 1;
+}
+
 template <class T>
 bool show_in_memory(std::ostream& out, T value) {
     if (!is_plain_string(out)) return false;
     std::streambuf& string = *out.rdbuf();
     if (WriteArea::room(string) <= longest_value) return false;
     char* const begin = WriteArea::begin(string);
-    char* const end = show_integer(begin, shown(value));
+    char* const end = show(out, begin, shown(value));
+    if (std::is_floating_point_v<T> && end == nullptr) return false;
     *end = ' ';
     WriteArea::fill_few(string, static_cast<int>(end + 1 - begin));
     return true;
 }
-
-// A character is no number.
-inline bool show_in_memory(std::ostream& out, char c) {
-    if (!is_plain_string(out)) return false;
-    std::streambuf& string = *out.rdbuf();
-    if (WriteArea::room(string) < 2) return false;
-    char* const at = WriteArea::begin(string);
-    at[0] = c;
-    at[1] = ' ';
-    WriteArea::fill_few(string, 2);
-    return true;
-}
-
-// Copies the `n` characters of a decimal, 2 to 16, in pieces that overlap.
-inline void copy_few(char* to, const char* from, std::size_t n) {
-    if (n >= 8) {
-        copy_bytes<8>(to, from);
-        copy_bytes<8>(to + n - 8, from + n - 8);
-    } else if (n >= 4) {
-        copy_bytes<4>(to, from);
-        copy_bytes<4>(to + n - 4, from + n - 4);
-    } else {
-        copy_bytes<2>(to, from);
-        to[n - 1] = from[n - 1];
-    }
-}
-
-// A decimal spoils what stands behind it while it is shown, and goes through other memory.
-inline bool show_in_memory(std::ostream& out, double value) {
-    if (!is_plain_string(out) || !has_plain_precision(out)) return false;
-    KEL_UNINITIALIZED char text[longest_decimal + 1];
-    char* const end = show_decimal(text, value);
-    if (end == nullptr) return false;
-    *end = ' ';
-    std::streambuf& string = *out.rdbuf();
-    const std::size_t n = static_cast<std::size_t>(end + 1 - text);
-    if (WriteArea::room(string) < n) return false;
-    copy_few(WriteArea::begin(string), text, n);
-    WriteArea::fill_few(string, static_cast<int>(n));
-    return true;
-}
-
-inline bool show_in_memory(std::ostream& out, float value) { return show_in_memory(out, shown(value)); }
 
 template <class T>
 bool scan_next(Scan& scan, T& value) {
