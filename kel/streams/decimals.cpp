@@ -204,7 +204,7 @@ bool nearest(bool negative, std::uint64_t digits, int exponent, Float& value) {
 
 }  // namespace
 
-char* show_decimal(char* at, double value) {
+char* show_decimal(char* at, const double& value) {
     std::uint64_t bits;
     std::memcpy(&bits, &value, sizeof bits);
     const int negative = static_cast<int>(bits >> 63);

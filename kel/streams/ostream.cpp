@@ -54,7 +54,7 @@ namespace {
 
 // The longer ways, kept out of the short one.
 template <class T>
-[[gnu::noinline]] KELostream& insert_elsewhere(KELostream& out, T value, std::uint32_t size) {
+[[gnu::noinline]] KELostream& insert_elsewhere(KELostream& out, const T& value, std::uint32_t size) {
     write_value(*out._strm, value);
     out._offset += size + 1;
     return out;
@@ -62,7 +62,7 @@ template <class T>
 
 // Writes one value and its separator. `size` is what the value itself counts.
 template <class T>
-KEL_FLATTEN KELostream& insert(KELostream& out, T value, std::uint32_t size) {
+KEL_FLATTEN KELostream& insert(KELostream& out, const T& value, std::uint32_t size) {
     if (!show_in_memory(text(out._strm), value)) return insert_elsewhere(out, value, size);
     out._offset += size + 1;
     return out;

@@ -16,8 +16,9 @@ namespace internal {
 constexpr int longest_decimal = 12;  // -1.23456e-22
 
 // The text of "%.6g" and its end, behind which nothing is changed. Null, and no text, for a number of the
-// ordinary way.
-char* show_decimal(char* at, double value);
+// ordinary way. The value is looked at where it lies: a 32-bit processor that loads a double whose halves
+// were stored apart, as arguments are, waits as long as for its digits.
+char* show_decimal(char* at, const double& value);
 
 // `digits` * 10^`exponent`, rounded to nearest, or what is as far below 0. False, and no value, for a number
 // of the ordinary way.

@@ -121,25 +121,22 @@ inline std::uint64_t high_product(std::uint64_t a, std::uint64_t b) {
 
 constexpr std::uint32_t eight_digits = 100000000;  // the first number of nine
 
-// A number in parts of eight digits, the last one apart: what stands before it, and it.
+// The last eight digits of a number of 64 bits, and what stands before them. Its upper half is below 10^8.
 struct LastEight {
-    explicit LastEight(std::uint64_t n) {
+    LastEight(std::uint32_t upper, std::uint32_t lower) {
 #ifdef __i386__
-        // Two divisions of what one instruction divides; for all 64 bits at once the compiler calls a
-        // function.
-        const std::uint32_t upper = static_cast<std::uint32_t>(n >> 32);
-        std::uint32_t quotient;
+        // One instruction, which the compiler does not use: it would have to know that the quotient fits.
         __asm__("divl %[by]"
-                : "=a"(quotient), "=d"(last)
-                : "a"(static_cast<std::uint32_t>(n)), "d"(upper % eight_digits), [by] "r"(eight_digits)
+                : "=a"(first), "=d"(last)
+                : "a"(lower), "d"(upper), [by] "r"(eight_digits)
                 : "cc");
-        first = std::uint64_t(upper / eight_digits) << 32 | quotient;
 #else
-        first = n / eight_digits;
+        const std::uint64_t n = std::uint64_t(upper) << 32 | lower;
+        first = static_cast<std::uint32_t>(n / eight_digits);
         last = static_cast<std::uint32_t>(n % eight_digits);
 #endif
     }
-    std::uint64_t first;
+    std::uint32_t first;
     std::uint32_t last;
 };
 
@@ -157,13 +154,15 @@ inline char* show_integer(char* at, std::uint32_t n) {
 }
 
 inline char* show_integer(char* at, std::uint64_t n) {
-    if (n <= 0xffffffffu) return show_integer(at, static_cast<std::uint32_t>(n));
-    KEL_UNINITIALIZED const LastEight ends(n);
-    if (ends.first <= 0xffffffffu) {
-        at = show_integer(at, static_cast<std::uint32_t>(ends.first));
+    const std::uint32_t upper = static_cast<std::uint32_t>(n >> 32);
+    const std::uint32_t lower = static_cast<std::uint32_t>(n);
+    if (upper == 0) return show_integer(at, lower);
+    KEL_UNINITIALIZED const LastEight ends(upper % eight_digits, lower);
+    if (upper < eight_digits) {
+        at = show_integer(at, ends.first);
     } else {
-        KEL_UNINITIALIZED const LastEight middle(ends.first);
-        at = show_integer(at, static_cast<std::uint32_t>(middle.first));
+        KEL_UNINITIALIZED const LastEight middle(upper / eight_digits, ends.first);
+        at = show_integer(at, middle.first);
         put_eight(at, middle.last);
         at += 8;
     }

@@ -30,7 +30,7 @@ template <class T>
 char* show(const std::ios_base&, char* at, T value) {
     return show_integer(at, value);
 }
-inline char* show(const std::ios_base& stream, char* at, double value) {
+inline char* show(const std::ios_base& stream, char* at, const double& value) {
     return has_plain_precision(stream) ? show_decimal(at, value) : nullptr;
 }
 inline char* show(const std::ios_base&, char* at, char c) {
@@ -39,7 +39,7 @@ inline char* show(const std::ios_base&, char* at, char c) {
 }
 
 template <class T>
-bool show_in_memory(std::ostream& out, T value) {
+bool show_in_memory(std::ostream& out, const T& value) {
     if (!is_plain_string(out)) return false;
     std::streambuf& string = *out.rdbuf();
     if (WriteArea::room(string) <= longest_value) return false;

@@ -30,7 +30,7 @@ inline std::istream& text(std::istream* stream) {
 // What is handed to the standard inserter: bytes and wide characters go as numbers, single
 // precision as double.
 template <class T>
-T shown(T value) {
+const T& shown(const T& value) {
     return value;
 }
 inline int shown(unsigned char value) { return value; }
