@@ -11,7 +11,7 @@ from collections import namedtuple
 
 LIMIT, KEL = "limit", "kel"
 
-Figure = namedtuple("Figure", "ns spread")  # the spread as a share of the median
+Figure = namedtuple("Figure", "ns spread least")  # the spread as a share of the median
 Goal = namedtuple("Goal", "peer most")
 Work = namedtuple("Work", "topic name figures goal")  # figures by contender
 
@@ -28,9 +28,9 @@ def _time_of(run):
 def _figure(times):
     median = statistics.median(times)
     if len(times) < 2:
-        return Figure(median, 0)
+        return Figure(median, 0, median)
     low, _, high = statistics.quantiles(times, n=4, method="inclusive")
-    return Figure(median, (high - low) / median)
+    return Figure(median, (high - low) / median, min(times))
 
 
 def read(files):
@@ -96,3 +96,8 @@ def ratio(work, contender):
     if contender not in work.figures:
         return None
     return work.figures[KEL].ns / work.figures[contender].ns
+
+
+def least_ratio(work, contender):
+    """The same of the least times that were measured."""
+    return work.figures[KEL].least / work.figures[contender].least

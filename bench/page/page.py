@@ -4,15 +4,17 @@
     page.py BITS FOLDER TOPIC...            prints the table
     page.py BITS FOLDER --write TOPIC...    also writes docs/performance*.{md,svg}
 
-FOLDER is the build's: results/TOPIC.json, bench/peers.txt and machine.txt are read from there. scripts/bench
+FOLDER is the build's: results/TOPIC.*.json, bench/peers.txt and machine.txt are read from there. scripts/bench
 calls it.
 """
 
+import glob
 import os
 import sys
 
 import charts
 import figures
+import profile
 
 TOP = os.path.join(os.path.dirname(__file__), "..", "..")
 NEAR = 1.05  # what two runs of the same thing differ by: no reason is asked for
@@ -90,6 +92,18 @@ def reason_list(works, why):
     return "\n".join(lines) if lines else "None: the library is ahead or level everywhere."
 
 
+def profile_list(works, folder):
+    if not profile.is_possible():
+        return "perf was not installed."
+    lines = []
+    for work in works:
+        if is_missed(work):
+            closest = figures.least_ratio(work, work.goal.peer)
+            where = profile.profile(folder, work.topic, work.name)
+            lines.append(f"- **{work.name}** (at most {work.goal.most:g}; closest {closest:.2f}): {where}.")
+    return "\n".join(lines) if lines else "No goal is missed."
+
+
 def summary(works):
     asked = [work for work in works if work.goal and figures.ratio(work, work.goal.peer) is not None]
     missed = [work.name for work in asked if is_missed(work)]
@@ -103,6 +117,7 @@ def page(bits, works, curves, folder, suffix):
     return template.format(
         width="32-bit x86" if bits == "32" else "x86-64", option="" if bits == "32" else " --x86_64",
         suffix=suffix, summary=summary(works), table=marked_table(works), reasons=reason_list(works, why),
+        profiles=profile_list(works, folder),
         machine=open(os.path.join(folder, "machine.txt"), encoding="utf-8").read().strip(),
         curves=", ".join(sorted({name.split(",")[0] for name in curves})))
 
@@ -115,7 +130,9 @@ def write(name, text):
 
 def main(bits, folder, *topics):
     writes = "--write" in topics
-    files = [(topic, os.path.join(folder, "results", topic + ".json")) for topic in topics if topic != "--write"]
+    topics = [topic for topic in topics if topic != "--write"]
+    files = [(topic, file) for topic in topics
+             for file in sorted(glob.glob(os.path.join(folder, "results", topic + ".*.json")))]
     measured = figures.read(files)
     works = figures.works(measured, figures.goals(os.path.join(TOP, "bench", "goals.txt")))
     print(plain_table(works))
