@@ -170,7 +170,7 @@ void names(const std::string& who) {
     name_line("string key, hit at 1,000", who, bench::random_names(1000), hit_anew<Table, Keys>);
     name_line("string key, hit at 1,000 numbered names", who, bench::numbered_names(1000),
               hit_anew<Table, Keys>);
-    for (long n = 16; n <= 1 << 18; n *= 4) {
+    for (long n = 16; n <= 1 << 20; n *= 4) {
         grow<Table>("dictionary, hit by string", who, n, [=] {
             static std::map<long, std::vector<std::string>> texts;  // the keys point into them
             return bench::pointers(texts.emplace(n, bench::random_names(n)).first->second);

@@ -171,7 +171,7 @@ const bool registered = [] {
 #ifdef KEL_BENCH_ACE
     line("detached thread, start to end", "ACE_Thread", ace)->UseRealTime();
 #endif
-    for (long n = 16; n <= 1024; n *= 4) {
+    for (long n = 16; n <= 4096; n *= 4) {
         growth("threads at once, one of them", kLimit, n, [=](benchmark::State& state) {
             many_raw(state, n);
         })->UseRealTime();

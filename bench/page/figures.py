@@ -15,7 +15,7 @@ Figure = namedtuple("Figure", "ns spread least")  # the spread as a share of the
 Goal = namedtuple("Goal", "peer most")
 Work = namedtuple("Work", "topic name figures goal")  # figures by contender
 
-_SUFFIX = re.compile(r"/(real_time|manual_time|iterations:\d+|process_time|threads:\d+)")
+_SUFFIX = re.compile(r"/(real_time|manual_time|iterations:\d+|process_time|threads:\d+|repeats:\d+)")
 
 
 def _time_of(run):
