@@ -203,6 +203,9 @@ TEST(PlainWriting, ChangesNothingBehindWhatItOverwrites) {
         same_writing([&](KELostream& out) { out << value; }, in_the_middle);
     }
     for (double value : decimals()) same_writing([&](KELostream& out) { out << value; }, in_the_middle);
+    for (int number = 0; number < 2000; ++number) {
+        same_writing([&](KELostream& out) { out << number * 1.0 << number / 16.0; }, in_the_middle);
+    }
     for (const char* s : {"", "s", "a longer string", "\x01\""}) {
         same_writing([&](KELostream& out) { out << 'c' << s; }, in_the_middle);
     }
