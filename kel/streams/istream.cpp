@@ -20,10 +20,23 @@ static std::ios_base::Init iostreams;
 namespace kel {
 namespace internal {
 
-const void* classic_locale_holds = held_by(std::locale::classic());
+const void* classic_locale_holds;
 
 }  // namespace internal
 }  // namespace kel
+
+namespace {
+
+// A client's static objects and their threads may use streams meanwhile.
+struct ClassicLocale {
+    ClassicLocale() {
+        const void* const held = kel::internal::held_by(std::locale::classic());
+        __atomic_store_n(&kel::internal::classic_locale_holds, held, __ATOMIC_RELAXED);
+    }
+};
+const ClassicLocale classic_locale;
+
+}  // namespace
 
 // ---- the process's own standard streams ----
 

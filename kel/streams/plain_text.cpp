@@ -32,7 +32,7 @@ void write_through_buffer(std::ostream& out, const char* text, std::size_t n) {
     out.setstate(state);
 }
 
-// Writes to a stream over a string that has to grow.
+// Writes to a stream over a string in which there may be too little room.
 template <class T>
 bool show_and_grow(std::ostream& out, T value) {
     KEL_UNINITIALIZED char text[longest_value + 1];
@@ -96,7 +96,7 @@ KEL_FLATTEN unsigned int show_values(std::ostream& out, const T* values, unsigne
     char* at = begin;
     unsigned int count = show_between(out, at, WriteArea::end(string), values, n);
     WriteArea::fill(string, static_cast<std::size_t>(at - begin));
-    if (count > 0) return count;
+    if (count > 0 || WriteArea::room(string) > longest_value) return count;
 
     KEL_UNINITIALIZED char block[512];
     at = block;

@@ -56,16 +56,18 @@ public:
 
 // Tells the next character as in.peek() does. For a stream over a string with nothing tied to it.
 inline int peek(std::istream& in) {
+    if (!in.good()) return in.peek();
     const char* const at = ReadArea::begin(*in.rdbuf());
-    if (!in.good() || at == ReadArea::end(*in.rdbuf())) return in.peek();
+    if (at == ReadArea::end(*in.rdbuf())) return in.peek();
     InputCount::set(in, 0);
     return static_cast<unsigned char>(*at);
 }
 
 // Consumes the next character as in.get() does. For a stream over a string that throws nothing.
 inline int take(std::istream& in) {
+    if (!in.good()) return in.get();
     const char* const at = ReadArea::begin(*in.rdbuf());
-    if (!in.good() || at == ReadArea::end(*in.rdbuf())) return in.get();
+    if (at == ReadArea::end(*in.rdbuf())) return in.get();
     const int c = static_cast<unsigned char>(*at);
     ReadArea::consume(*in.rdbuf(), 1);
     InputCount::set(in, 1);

@@ -37,12 +37,12 @@ inline const void* held_by(const std::locale& locale) {
 extern const void* classic_locale_holds;
 
 inline bool has_classic_locale(const std::ios_base& stream) {
-    return held_by(stream._M_getloc()) == classic_locale_holds;
+    return held_by(stream._M_getloc()) == __atomic_load_n(&classic_locale_holds, __ATOMIC_RELAXED);
 }
 
 // Has no tied stream to flush, no flush of its own after each piece (a flag), and throws nothing. What would
 // speak against it is put together before it is looked at: with one question for each, the questions took a
-// tenth of the time of a number. Only a stream that another one was moved into is good without a buffer.
+// tenth of the time of a number. A stream that another one was moved into may be good without a buffer.
 inline bool is_plain(const std::ios& stream) {
     const std::ios_base::fmtflags born_with = std::ios_base::skipws | std::ios_base::dec;
     const std::uintptr_t unusual = static_cast<std::uintptr_t>(stream.rdstate() | stream.exceptions()) |

@@ -116,7 +116,9 @@ std::uint64_t largest(bool negative) {
     return std::is_signed_v<T> ? positive + 1 : 0;
 }
 
-// Each gives the value, or false for a number of the ordinary way. The scan has then gone anywhere.
+// The functions named scan_number and scan_rest give the value, or false for a number of the ordinary way.
+// The scan has then gone anywhere.
+//
 // A number that may be too large, of which `number` has the first digits, as many as always fit: one digit
 // more where they are nine. With more still it is too large or begins with zeros.
 template <class T>
@@ -130,8 +132,8 @@ std::enable_if_t<sizeof(T) <= 4, bool> scan_rest(Scan& scan, bool negative, std:
     return true;
 }
 
-// Where they are eighteen, two digits more, and by a function of its own. It gives the end of the number and
-// is handed no scan, for one without an address stays in registers.
+// Where they are eighteen, as many more as 64 bits hold, by a function of its own. It gives the end of the
+// number, null for one of the ordinary way, and is handed no scan: one without an address stays in registers.
 template <class T>
 [[gnu::noinline]] const char* scan_last_digits(const char* at, const char* end, bool negative,
                                                std::uint64_t number, T& value) {
@@ -148,8 +150,9 @@ template <class T>
 template <class T>
 std::enable_if_t<sizeof(T) == 8, bool> scan_rest(Scan& scan, bool negative, std::uint64_t number, T& value) {
     const char* const behind = scan_last_digits(scan.at(), scan.end(), negative, number, value);
+    if (behind == nullptr) return false;
     scan.go_on_at(behind);
-    return behind != nullptr;
+    return true;
 }
 
 template <class T>

@@ -5,7 +5,7 @@
 //   show_in_memory    writes one value and its separator
 //   scan_in_memory    reads one value, alone or with the character behind it
 //
-// Both return false, and have changed nothing, where the value has to go another way.
+// Both return false, and have written and read nothing, where the value has to go another way.
 //
 // SPDX-License-Identifier: MIT
 #ifndef KEL_STREAMS_INTERNAL_SHORT_WAY_H

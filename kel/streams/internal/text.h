@@ -41,8 +41,8 @@ inline double shown(float value) { return value; }
 template <class T>
 void write_value(std::ostream& out, T value);
 
-// Writes as many of `n` values as have a short way on this stream and fit into one block, and returns
-// how many. The next one, if there is one to write, has to be written by itself.
+// Writes as many of `n` values as have a short way on this stream and fit into the memory of its string, or
+// into one block, and returns how many. When there is none, the next one has to be written by itself.
 template <class T>
 unsigned int show_values(std::ostream& out, const T* values, unsigned int n);
 

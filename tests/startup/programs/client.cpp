@@ -9,9 +9,12 @@
 #include <kel/exceptions/standard.h>
 #include <kel/services/debug_logger.h>
 #include <kel/services/environment.h>
+#include <kel/streams/istream.h>
+#include <kel/streams/ostream.h>
 
 #include <cstdlib>
 #include <cstring>
+#include <sstream>
 
 namespace {
 
@@ -51,6 +54,18 @@ void remember_in_the_environment() {
     environment->clear();
 }
 
+void write_and_read() {
+    std::stringstream text;
+    KELostream out(text);
+    out << 4711 << 1.5 << "text";
+    KEListream in(text);
+    int number = 0;
+    double decimal = 0;
+    CORBA_String_var string;
+    in >> number >> decimal >> string;
+    check(number == 4711 && decimal > 1.4 && std::strcmp(string.in(), "text") == 0);
+}
+
 // Builds and releases one of each kind.
 void use_others() {
     KELMutex plain;
@@ -64,6 +79,7 @@ void use_others() {
     counted->_unref();
     throw_and_catch();
     remember_in_the_environment();
+    write_and_read();
 }
 
 // What one keeps from load to exit is used again at exit.
