@@ -22,21 +22,20 @@ namespace internal {
 
 const void* classic_locale_holds;
 
-}  // namespace internal
-}  // namespace kel
-
 namespace {
 
 // A client's static objects and their threads may use streams meanwhile.
 struct ClassicLocale {
     ClassicLocale() {
-        const void* const held = kel::internal::held_by(std::locale::classic());
-        __atomic_store_n(&kel::internal::classic_locale_holds, held, __ATOMIC_RELAXED);
+        __atomic_store_n(&classic_locale_holds, held_by(std::locale::classic()), __ATOMIC_RELAXED);
     }
 };
 const ClassicLocale classic_locale;
 
 }  // namespace
+
+}  // namespace internal
+}  // namespace kel
 
 // ---- the process's own standard streams ----
 
