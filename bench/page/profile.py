@@ -87,10 +87,10 @@ def _short(function):
     operator = re.search(r"operator(<<|>>|\(\)|[^\w\s]+)", name)
     if operator:
         return name[:operator.end()].split(" ")[-1]
-    name = re.sub(r"\(.*", "", name)
+    name = name.replace("<=", "")  # in the condition of a template, no bracket
     while (shorter := re.sub(r"<[^<>]*>", "", name)) != name:
         name = shorter
-    return name.split(" ")[-1]
+    return re.sub(r"\(.*", "", name).split(" ")[-1]
 
 
 def _place(file, function, symbol):
