@@ -58,11 +58,9 @@ void CORBA_SystemException::_write(KELostream& out) const {
 // Deliberate: the minor-code rule is left out here. What the sender stored is what arrives.
 // Pinned by SystemExceptionBody.ReadingKeepsAMinorCodeOutsideEverySet.
 void CORBA_SystemException::_copy(KEListream& in) {
-    unsigned long code = _minor;
+    in >> _minor;
     unsigned long status = _completed;
-    in >> code;
     in >> status;
-    _minor = code;
     _completed = status_of(status);
 }
 
