@@ -60,13 +60,14 @@ TimeText last_time;
 bool last_time_taken;  // by a thread; others do without it, and so does a child whose parent's thread had it
 
 // What ctime has for `now` without its newline, or nothing.
-void make_time_text(std::time_t now, char (&text)[time_room]) {
+void make_time_text(std::time_t now, char* text) {
     tzset();  // ctime_r, unlike ctime, need not look at a changed TZ
     if (ctime_r(&now, text) == nullptr) text[0] = '\0';
     text[time_length] = '\0';
 }
 
-void local_time_text(std::time_t now, char (&text)[time_room]) {
+// Fills `time_room` characters.
+void local_time_text(std::time_t now, char* text) {
     const char* zone = std::getenv("TZ");
     if (zone == nullptr) zone = no_zone;
     const std::size_t length = strnlen(zone, longest_zone + 1);
@@ -86,11 +87,6 @@ void local_time_text(std::time_t now, char (&text)[time_room]) {
 // ---- the pieces of a header ----
 
 const std::size_t longest_short_name = 255;
-
-char* put_text(char* at, const char* text) {
-    while (*text != '\0') *at++ = *text++;
-    return at;
-}
 
 // At least `width` digits.
 char* put_hexadecimal(char* at, std::uint32_t n, int width) {
@@ -215,7 +211,7 @@ KELDebugLogger& KELDebugLogger::start(unsigned int level, unsigned int module, c
                       "KELDebugLogger& KELDebugLogger::start(unsigned int, unsigned int, const char*, int)");
     lock();
     if (_in_line != 0 || !prints(module, group)) return *this;
-    openFile();
+    if (!is_open()) openFile();
     if (!is_open()) return *this;
     // Deliberate: the check comes before its header is printed, so the first one looks at 499 headers and
     // later ones at 500. Pinned by DebugLogTrimming.TheFiveHundredthStartTrimsBeforeItsHeader.
@@ -237,30 +233,32 @@ bool KELDebugLogger::prints(unsigned int module, int group) const {
 // longer than the system takes to write it.
 void KELDebugLogger::print_header(unsigned int level, unsigned int module, const char* file, int line) {
     const std::time_t now = std::time(nullptr);
-    KEL_UNINITIALIZED char text[time_room];
-    local_time_text(now, text);
-    if (file == nullptr || std::strlen(file) > longest_short_name) {
+    const std::size_t length = file != nullptr ? std::strlen(file) : longest_short_name + 1;
+    if (length > longest_short_name) {
+        char text[time_room];
+        local_time_text(now, text);
         std::fprintf(_fp, "=> %s,%02x,%08x,%s,%d,%d\n", text, level, module, file, line,
                      static_cast<int>(now));
         return;
     }
     KEL_UNINITIALIZED char header[longest_short_name + 100];
-    char* at = put_text(header, "=> ");
-    std::memcpy(at, text, time_room);
-    if (text[0] != '\0') at += time_length;
+    std::memcpy(header, "=> ", 3);
+    char* at = header + 3;
+    local_time_text(now, at);
+    if (*at != '\0') at += time_length;
     *at++ = ',';
     at = put_hexadecimal(at, level, 2);
     *at++ = ',';
     at = put_hexadecimal(at, module, 8);
     *at++ = ',';
-    at = put_text(at, file);
+    std::memcpy(at, file, length);
+    at += length;
     *at++ = ',';
     at = show_integer(at, line);
     *at++ = ',';
     at = show_integer(at, static_cast<int>(now));
-    at = put_text(at, "\n");
-    *at = '\0';
-    std::fputs(header, _fp);
+    *at++ = '\n';
+    std::fwrite(header, 1, static_cast<std::size_t>(at - header), _fp);
 }
 
 // Inside a line _fp is null only after a closeFile() in its middle; the rest of that line is lost.
@@ -271,9 +269,8 @@ KELDebugLogger& KELDebugLogger::operator<<(const char* s) {
 
 KELDebugLogger& KELDebugLogger::operator<<(long n) {
     if (_in_line != 0 && _fp != nullptr) {
-        KEL_UNINITIALIZED char text[longest_integer + 1];
-        *show_integer(text, n) = '\0';
-        std::fputs(text, _fp);
+        KEL_UNINITIALIZED char text[longest_integer];
+        std::fwrite(text, 1, static_cast<std::size_t>(show_integer(text, n) - text), _fp);
     }
     return *this;
 }
