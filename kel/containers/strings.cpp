@@ -37,6 +37,13 @@ char* alloc_empty(unsigned long len) {
     return s;
 }
 
+// Not in line: its variable would have the reading of text watch the stack as well.
+__attribute__((noinline)) unsigned long read_length(KEListream& in) {
+    unsigned long n = 0;
+    in >> n;
+    return n;
+}
+
 // Reads `n` bytes into `buffer`, which has room for `capacity`, and makes a string of them even when
 // the peer sent no terminator or the stream throws.
 void read_terminated(KEListream& in, char* buffer, unsigned long capacity, unsigned int n) {
@@ -121,8 +128,7 @@ KEListream& operator>>(KEListream& in, CORBA_String_var& s) {
         return in;
     }
 
-    unsigned long n = 0;
-    in >> n;
+    const unsigned long n = read_length(in);
     if (n == 0) {
         // Deliberate: a zero length is null and not "". Pinned by
         // BinaryStrings.ZeroLengthReadsAsNullByDefault.

@@ -109,12 +109,11 @@ struct FewCharacters {
 
 // Six digits without the zeros at the end.
 FewCharacters significant_digits(std::uint32_t six) {
-    // The digits come out of a fraction in front of its point, as in put_eight.
-    const std::uint64_t first = std::uint64_t(six) * 429497;  // 2^32 / 10^4, rounded up
-    const std::uint64_t second = (first & 0xffffffff) * 100;
-    const std::uint64_t third = (second & 0xffffffff) * 100;
-    const std::uint32_t four = pair_of_digits(first >> 32) | pair_of_digits(second >> 32) << 16;
-    const std::uint32_t two = pair_of_digits(third >> 32);
+    const std::uint32_t first = six / 10000;
+    const std::uint32_t last_four = six - first * 10000;
+    const std::uint32_t second = hundreds_of(last_four);
+    const std::uint32_t four = pair_of_digits(first) | pair_of_digits(second) << 16;
+    const std::uint32_t two = pair_of_digits(last_four - second * 100);
     const std::uint64_t word = std::uint64_t(two) << 32 | four;
     return {word, 8 - __builtin_clzll(word & 0x0f0f0f0f0f0f) / 8};
 }

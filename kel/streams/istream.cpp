@@ -42,9 +42,8 @@ const ClassicLocale classic_locale;
 namespace kel {
 namespace internal {
 
-bool is_cout_or_cerr(const std::ostream* stream) { return stream == &std::cout || stream == &std::cerr; }
-bool is_console(const std::ostream* stream) { return is_cout_or_cerr(stream) || stream == &std::clog; }
-bool is_cin(const std::istream* stream) { return stream == &std::cin; }
+constexpr Consoles addresses{&std::cin, &std::cout, &std::cerr, &std::clog};
+const Consoles consoles = addresses;
 std::ostream& error_stream() { return std::cerr; }
 
 void no_standard_stream(const char* operations) {

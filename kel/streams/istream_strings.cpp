@@ -4,6 +4,7 @@
 #include <kel/streams/internal/areas.h>
 #include <kel/streams/internal/console.h>
 #include <kel/streams/internal/escapes.h>
+#include <kel/streams/internal/own_functions.h>
 #include <kel/streams/internal/plain.h>
 #include <kel/streams/internal/quoted_text.h>
 #include <kel/streams/internal/runs.h>
@@ -17,16 +18,20 @@
 #include <new>
 #include <string>
 
+using kel::internal::copy_quoted_run;
 using kel::internal::error_stream;
 using kel::internal::Escape;
 using kel::internal::escapes;
+using kel::internal::extract_value;
+using kel::internal::has_own_functions;
 using kel::internal::InputCount;
 using kel::internal::is_cin;
-using kel::internal::is_plain_string;
+using kel::internal::plain_string;
 using kel::internal::QuotedTarget;
 using kel::internal::read_quoted_text;
 using kel::internal::read_value;
 using kel::internal::ReadArea;
+using kel::internal::scan_in_string;
 using kel::internal::text;
 
 namespace {
@@ -55,7 +60,7 @@ wchar_t* new_wide_array(std::uint32_t n) {
 // The characters of a stream one by one, in the shortest way that it has.
 class Characters {
 public:
-    explicit Characters(std::istream& in) : _in(in), _in_memory(is_plain_string(in)) {}
+    explicit Characters(std::istream& in) : _in(in), _in_memory(plain_string(in) != nullptr) {}
 
     bool in_memory() const { return _in_memory; }
     int peek() { return _in_memory ? kel::internal::peek(_in) : _in.peek(); }
@@ -67,22 +72,30 @@ private:
 };
 
 // A string without escapes that lies in memory from its opening quote to the character behind its closing
-// one, as most do. Gives how many characters it has; -1, and nothing is read, for any other and where there
-// is no room for it and its terminator.
-std::int64_t take_whole_string(std::istream& in, char* buf, std::uint32_t room) {
-    std::streambuf& string = *in.rdbuf();
+// one, as most do. False, and nothing is read, for any other and where there is no room for it and its
+// terminator: `buf` has then the beginning of what will be stored there.
+bool take_whole_string(std::istream& in, std::streambuf& string, char* buf, std::uint32_t room,
+                       std::uint32_t& offset) {
     const char* const begin = ReadArea::begin(string);
     const std::ptrdiff_t there = ReadArea::end(string) - begin;
-    if (there < 3 || *begin != '"') return -1;
+    if (there < 3 || *begin != '"') return false;
     const char* const contents = begin + 1;
     const std::size_t most = std::min<std::size_t>(static_cast<std::size_t>(there) - 2, room);
-    const std::size_t n = kel::internal::quoted_run(contents, most);
-    if (n == most || contents[n] != '"') return -1;
-    std::memcpy(buf, contents, n);
+    const std::size_t n = copy_quoted_run(buf, contents, most);
+    if (n == most || contents[n] != '"') return false;
     buf[n] = '\0';
     ReadArea::consume(string, static_cast<std::ptrdiff_t>(n) + 3);
     InputCount::set(in, 1);
-    return static_cast<std::int64_t>(n);
+    offset += static_cast<std::uint32_t>(n) + 2;
+    return true;
+}
+
+// Whether memory has the next character and it is not `c`. Then it has been peeked at.
+bool another_comes_next(std::istream& in, const std::streambuf& string, char c) {
+    const char* const at = ReadArea::begin(string);
+    if (at == ReadArea::end(string) || *at == c) return false;
+    InputCount::set(in, 0);
+    return true;
 }
 
 // Consumes the opening quote if it comes next, as it does where the writer has been.
@@ -210,12 +223,34 @@ bool takes_room(int c) { return c != '"' && c != '\n' && c != end_of_input; }
 
 // Reads a quoted string into a new one. What a stream throws leaves that empty: nobody could tell what has
 // been stored from what its memory held before.
-void read_into(KEListream& in, char* s, std::uint32_t length) {
+[[gnu::noinline]] void read_into(KEListream& in, char* s, std::uint32_t length) {
     try {
         in.getCString(s, length);
     } catch (...) {
         s[0] = '\0';
         throw;
+    }
+}
+
+// A length by the ordinary way, which has an address and is kept out of the short one.
+[[gnu::noinline]] std::uint32_t extract_length(std::istream& in) {
+    std::uint32_t length = 0;
+    extract_value(in, length);
+    return length;
+}
+
+// What stands behind a length of 0 or 1: no string, or an empty one.
+[[gnu::noinline]] void read_no_more_than_one(KEListream& stream, char*& s, std::uint32_t length) {
+    std::istream& in = *stream._strm;
+    if (length == 0) {
+        in.get();
+        stream._offset += 1;
+    } else if (in.peek() == '"') {
+        s = new_string(2);  // the quotes are trusted for no more than the two bytes of this room
+        read_into(stream, s, 2);
+    } else {
+        in.get();
+        s = new_string(0);
     }
 }
 
@@ -238,34 +273,27 @@ KEL_FLATTEN KEListream& KEListream::operator>>(char*& s) {
         return *this;
     }
 
-    std::uint32_t length = 0;
-    read_value(in, length);
+    std::streambuf* const string = plain_string(in);
+    KEL_UNINITIALIZED std::uint32_t length;
+    const bool in_memory = string != nullptr && scan_in_string<0>(in, *string, length);
+    if (!in_memory) length = extract_length(in);
     _offset += 4;
-    CORBA::string_free(s);
+    if (s != nullptr) CORBA::string_free(s);
     s = nullptr;
 
-    if (length == 0) {
-        in.get();
-        _offset += 1;
+    if (length <= 1) {
+        read_no_more_than_one(*this, s, length);
         return *this;
     }
-    if (length == 1) {
-        if (in.peek() == '"') {
-            s = new_string(2);  // the quotes are trusted for no more than the two bytes of this room
-            read_into(*this, s, 2);
-        } else {
-            in.get();
-            s = new_string(0);
-        }
-        return *this;
-    }
-    Characters characters(in);
     s = new_string(length);
-    read_into(*this, s, length);
+    const bool taken =
+        in_memory && has_own_functions(*this) && take_whole_string(in, *string, s, length, _offset);
+    if (taken && another_comes_next(in, *string, '\n')) return *this;
+    if (!taken) read_into(*this, s, length);
     // Deliberate: a newline here is taken even when the string had room for its terminator and the
     // newline is the next item's. Pinned by StringReading.ANewlineBehindTheStringIsTaken.
-    if (characters.peek() == '\n') {
-        characters.take();
+    if (in.peek() == '\n') {
+        in.get();
         s[length] = '\0';
     }
     return *this;
@@ -273,11 +301,9 @@ KEL_FLATTEN KEListream& KEListream::operator>>(char*& s) {
 
 KEL_FLATTEN KEListream& KEListream::getCString(char* buf, unsigned int len) {
     std::istream& in = text(_strm);
-    const std::int64_t n = is_plain_string(in) ? take_whole_string(in, buf, len) : -1;
-    if (n < 0) {
+    std::streambuf* const string = plain_string(in);
+    if (string == nullptr || !take_whole_string(in, *string, buf, len, _offset)) {
         read_quoted(in, {buf, len, _offset});
-    } else {
-        _offset += static_cast<std::uint32_t>(n) + 2;
     }
     return *this;
 }

@@ -1,22 +1,27 @@
 // SPDX-License-Identifier: MIT
-#include <kel/core/internal/attributes.h>
 #include <kel/streams/internal/areas.h>
 #include <kel/streams/internal/console.h>
+#include <kel/streams/internal/digits.h>
 #include <kel/streams/internal/escapes.h>
+#include <kel/streams/internal/own_functions.h>
 #include <kel/streams/internal/plain.h>
 #include <kel/streams/internal/runs.h>
 #include <kel/streams/internal/text.h>
 #include <kel/streams/ostream.h>
 
+#include <algorithm>
 #include <cctype>
 #include <cstring>
 #include <cwchar>
 
+using kel::internal::copy_plain_run;
 using kel::internal::Escape;
 using kel::internal::escapes;
+using kel::internal::has_own_functions;
 using kel::internal::is_cout_or_cerr;
-using kel::internal::is_plain_string;
-using kel::internal::plain_run;
+using kel::internal::longest_integer;
+using kel::internal::plain_string;
+using kel::internal::show_integer;
 using kel::internal::text;
 using kel::internal::write_bare;
 using kel::internal::WriteArea;
@@ -31,7 +36,7 @@ char escape_letter(char c) {
     return 0;
 }
 
-constexpr int longest_escape = 4;
+constexpr std::size_t longest_escape = 4;
 
 // One character as it stands in a quoted string: 1 to 4 characters. Gives their end.
 char* show_quoted(char* at, char c) {
@@ -61,87 +66,79 @@ std::uint32_t write_quoted(std::ostream& out, char c) {
     return static_cast<std::uint32_t>(end - text);
 }
 
-// Puts pieces of a quoted string straight into the room that a string buffer has, and those for which there
-// is none through the stream, which makes more. What is refused there counts all the same.
-class Quoting {
-public:
-    explicit Quoting(std::ostream& out) : _out(out), _string(*out.rdbuf()) { look(); }
-    ~Quoting() { WriteArea::fill(_string, filled()); }
-    Quoting(const Quoting&) = delete;
-    Quoting& operator=(const Quoting&) = delete;
+constexpr std::size_t quotes_and_newline = 3;
+constexpr std::size_t closing = 2;
 
-    void add(const char* text, std::size_t n) {
-        _count += n;
-        if (n > static_cast<std::size_t>(_end - _at)) {
-            write(text, n);
-            return;
-        }
-        if (n == 0) return;  // and perhaps no room at all
-        std::memcpy(_at, text, n);
-        _at += n;
-    }
-
-    void add(char c) { add(&c, 1); }
-
-    void add_quoted(char c) {
-        KEL_UNINITIALIZED char text[longest_escape];
-        add(text, static_cast<std::size_t>(show_quoted(text, c) - text));
-    }
-
-    std::size_t count() const { return _count; }
-
-private:
-    // There is no room behind a piece that was refused.
-    void look() {
-        _begin = WriteArea::begin(_string);
-        _end = _out.good() ? WriteArea::end(_string) : _begin;
-        _at = _begin;
-    }
-
-    std::size_t filled() const { return static_cast<std::size_t>(_at - _begin); }
-
-    void write(const char* text, std::size_t n) {
-        WriteArea::fill(_string, filled());
-        _begin = _at;
-        _out.write(text, static_cast<std::streamsize>(n));
-        look();
-    }
-
-    std::ostream& _out;
-    std::streambuf& _string;
-    std::size_t _count = 0;
-    char* _begin;
-    char* _at;
-    char* _end;
-};
-
-// The quoted form. Returns the number of its characters.
-std::size_t write_quoted_runs(std::ostream& out, const char* s) {
-    KEL_UNINITIALIZED Quoting quoting(out);
-    quoting.add('"');
-    for (std::size_t left = std::strlen(s); left > 0;) {
-        const std::size_t run = plain_run(s, left);
-        quoting.add(s, run);
+// The quoted form of `n` characters in front of `end`, where there is room for it unless escapes make it
+// longer. Gives its end, or null when there may be no room: then its beginning is there.
+char* show_quoted_runs(char* at, const char* end, const char* s, std::size_t n) {
+    *at++ = '"';
+    for (;;) {
+        const std::size_t run = copy_plain_run(at, s, n);
+        at += run;
+        if (run == n) break;
         s += run;
-        left -= run;
-        if (left == 0) break;
-        quoting.add_quoted(*s++);
-        --left;
+        n -= run;
+        if (static_cast<std::size_t>(end - at) < longest_escape + n + closing) return nullptr;
+        at = show_quoted(at, *s++);
+        --n;
     }
-    quoting.add('"');
-    quoting.add('\n');
-    return quoting.count();
+    *at++ = '"';
+    *at++ = '\n';
+    return at;
+}
+
+// The same of a plain stream over a string, which makes room. Returns the number of characters: what is
+// refused because there is no memory counts all the same.
+std::size_t write_quoted_runs(std::ostream& out, const char* s, std::size_t n) {
+    std::streambuf& string = *out.rdbuf();
+    std::size_t count = quotes_and_newline;
+    out.put('"');
+    while (n > 0) {
+        const std::size_t room = out.good() ? WriteArea::room(string) : 0;
+        const std::size_t run = copy_plain_run(WriteArea::begin(string), s, std::min(n, room));
+        WriteArea::fill(string, run);
+        s += run;
+        n -= run;
+        count += run;
+        if (n == 0) break;
+        count += write_quoted(out, *s++);
+        --n;
+    }
+    out.put('"').put('\n');
+    return count;
+}
+
+// A string and its length straight into the memory of a plain stream's string. Returns the number of
+// characters of the quoted form; 0, and nothing is written, for any other stream and where there may be no
+// room.
+std::size_t show_string(std::streambuf* string, const char* s, std::size_t n) {
+    if (string == nullptr || WriteArea::room(*string) < longest_integer + n + quotes_and_newline) return 0;
+    char* const begin = WriteArea::begin(*string);
+    char* const quoted = show_integer(begin, n + 1);
+    char* const end = show_quoted_runs(quoted, WriteArea::end(*string), s, n);
+    if (end == nullptr) return 0;
+    WriteArea::fill(*string, static_cast<std::size_t>(end - begin));
+    return static_cast<std::size_t>(end - quoted);
 }
 
 }  // namespace
 
 KELostream& KELostream::operator<<(const char* s) {
     std::ostream& out = text(_strm);
-    const unsigned long length = s == nullptr ? 0 : std::strlen(s) + 1;
+    const std::size_t n = s == nullptr ? 0 : std::strlen(s);
+    const unsigned long length = s == nullptr ? 0 : n + 1;
     if (is_cout_or_cerr(&out)) {
         if (s != nullptr) out << s;
         _offset += static_cast<std::uint32_t>(length);
         return *this;
+    }
+    // Both parts at once, which takes half as long.
+    if (n > 0 && has_own_functions(*this)) {
+        if (const std::size_t quoted = show_string(plain_string(out), s, n)) {
+            _offset += 4 + static_cast<std::uint32_t>(quoted);
+            return *this;
+        }
     }
     write_bare(out, length);
     _offset += 4;
@@ -156,8 +153,8 @@ KELostream& KELostream::operator<<(const char* s) {
 
 KELostream& KELostream::putCString(const char* s) {
     std::ostream& out = text(_strm);
-    if (is_plain_string(out)) {
-        _offset += static_cast<std::uint32_t>(write_quoted_runs(out, s));
+    if (plain_string(out) != nullptr) {
+        _offset += static_cast<std::uint32_t>(write_quoted_runs(out, s, std::strlen(s)));
         return *this;
     }
     out.put('"');

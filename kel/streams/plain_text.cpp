@@ -90,13 +90,13 @@ unsigned int show_between(const std::ios_base& stream, char*& at, const char* en
 // through a block.
 template <class T>
 KEL_FLATTEN unsigned int show_values(std::ostream& out, const T* values, unsigned int n) {
-    if (!is_plain_string(out)) return 0;
-    std::streambuf& string = *out.rdbuf();
-    char* const begin = WriteArea::begin(string);
+    std::streambuf* const string = plain_string(out);
+    if (string == nullptr) return 0;
+    char* const begin = WriteArea::begin(*string);
     char* at = begin;
-    unsigned int count = show_between(out, at, WriteArea::end(string), values, n);
-    WriteArea::fill(string, static_cast<std::size_t>(at - begin));
-    if (count > 0 || WriteArea::room(string) > longest_value) return count;
+    unsigned int count = show_between(out, at, WriteArea::end(*string), values, n);
+    WriteArea::fill(*string, static_cast<std::size_t>(at - begin));
+    if (count > 0 || WriteArea::room(*string) > longest_value) return count;
 
     KEL_UNINITIALIZED char block[512];
     at = block;
@@ -142,10 +142,10 @@ KEL_FLATTEN void write_bare(std::ostream& out, unsigned long value) {
 
 template <class T>
 KEL_FLATTEN unsigned int scan_values(std::istream& in, T* values, unsigned int n) {
-    if (!is_plain_string(in)) return 0;
-    std::streambuf& string = *in.rdbuf();
-    const char* const begin = ReadArea::begin(string);
-    KEL_UNINITIALIZED Scan scan(begin, ReadArea::end(string));
+    std::streambuf* const string = plain_string(in);
+    if (string == nullptr) return 0;
+    const char* const begin = ReadArea::begin(*string);
+    KEL_UNINITIALIZED Scan scan(begin, ReadArea::end(*string));
     const char* taken = begin;
     unsigned int count = 0;
     for (; count < n; ++count) {
@@ -153,7 +153,7 @@ KEL_FLATTEN unsigned int scan_values(std::istream& in, T* values, unsigned int n
         if (!scan_next(scan, values[count])) break;
         taken = scan.at();
     }
-    ReadArea::consume(string, taken - begin);
+    ReadArea::consume(*string, taken - begin);
     return count;
 }
 

@@ -5,7 +5,6 @@
 #include <kel/streams/internal/runs.h>
 
 #include <algorithm>
-#include <cstring>
 
 namespace kel {
 namespace internal {
@@ -60,9 +59,7 @@ public:
 private:
     void copy_run() {
         const std::size_t most = std::min<std::size_t>(static_cast<std::size_t>(_end - _at), _to.room);
-        const std::uint32_t n = static_cast<std::uint32_t>(quoted_run(_at, most));
-        if (n == 0) return;  // and perhaps no buffer
-        std::memcpy(_to.buf, _at, n);
+        const std::uint32_t n = static_cast<std::uint32_t>(copy_quoted_run(_to.buf, _at, most));
         advance(n, n, n);
     }
 

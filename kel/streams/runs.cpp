@@ -4,10 +4,14 @@
 #include <kel/streams/internal/escapes.h>
 #include <kel/streams/internal/runs.h>
 
+#include <atomic>
+
 namespace kel {
 namespace internal {
 
 namespace {
+
+enum class Run { plain, quoted };
 
 // The characters that end a run, or do not.
 struct Characters {
@@ -29,77 +33,120 @@ constexpr Characters characters = told_apart();
 constexpr std::size_t block_size = 16;
 
 // Every x86-64 processor compares sixteen characters at once, and every 32-bit one that tells so.
-bool compares_blocks() {
 #ifdef __x86_64__
-    return true;
+bool compares_blocks() { return true; }
 #else
-    static const bool has_sse2 = [] {
-        unsigned a, b, c, d;
-        return __get_cpuid(1, &a, &b, &c, &d) != 0 && (d & bit_SSE2) != 0;
-    }();
-    return has_sse2;
-#endif
+enum class Sse2 { not_asked, absent, present };
+
+// No static of a function: a look at its guard, in a call, would take as long as a block.
+std::atomic<Sse2> sse2{Sse2::not_asked};
+
+[[gnu::cold, gnu::noinline]] Sse2 ask_for_sse2() {
+    unsigned a, b, c, d;
+    const bool has_it = __get_cpuid(1, &a, &b, &c, &d) != 0 && (d & bit_SSE2) != 0;
+    const Sse2 answer = has_it ? Sse2::present : Sse2::absent;
+    sse2.store(answer, std::memory_order_relaxed);
+    return answer;
 }
+
+inline bool compares_blocks() {
+    Sse2 answer = sse2.load(std::memory_order_relaxed);
+    if (answer == Sse2::not_asked) answer = ask_for_sse2();
+    return answer == Sse2::present;
+}
+#endif
 
 #define KEL_BLOCKS __attribute__((target("sse2")))
 
 KEL_BLOCKS __m128i block_at(const char* s) { return _mm_loadu_si128(reinterpret_cast<const __m128i*>(s)); }
 KEL_BLOCKS __m128i equal(__m128i block, char c) { return _mm_cmpeq_epi8(block, _mm_set1_epi8(c)); }
 
-// The characters of a block that end a run, as bytes of ones. What follows 'z' is seldom and ends a plain run
-// here as well.
-KEL_BLOCKS __m128i ends_of_plain_run(__m128i block) {
+// The characters of a block that end a run, as bytes of ones.
+template <Run>
+__m128i ends_of(__m128i block);
+
+// What follows 'z' is seldom and ends a plain run here as well: to tell the braces apart would take a sixth
+// of the time of a long string.
+template <>
+KEL_BLOCKS __m128i ends_of<Run::plain>(__m128i block) {
     const __m128i low = _mm_cmplt_epi8(block, _mm_set1_epi8(' '));  // bytes above 0x7f are negative
     const __m128i high = _mm_cmpgt_epi8(block, _mm_set1_epi8('z'));
     return _mm_or_si128(_mm_or_si128(low, high), _mm_or_si128(equal(block, '"'), equal(block, '\\')));
 }
 
-KEL_BLOCKS __m128i ends_of_quoted_run(__m128i block) {
+template <>
+KEL_BLOCKS __m128i ends_of<Run::quoted>(__m128i block) {
     return _mm_or_si128(_mm_or_si128(equal(block, '"'), equal(block, '\\')), equal(block, '\n'));
+}
+
+KEL_BLOCKS void put_block(char* to, __m128i block) {
+    _mm_storeu_si128(reinterpret_cast<__m128i*>(to), block);
 }
 
 std::size_t first_of(int places) {
     return static_cast<std::size_t>(__builtin_ctz(static_cast<unsigned>(places)));
 }
 
-// The run at the beginning of `n` characters, a block at least, in blocks, and four of them at once as long
-// as they are all in it. Long strings take an eighth of the time of single characters.
-template <__m128i ends(__m128i)>
-KEL_BLOCKS std::size_t run_in_blocks(const char* s, std::size_t n) {
-    std::size_t i = 0;
-    for (; n - i >= 4 * block_size; i += 4 * block_size) {
-        const char* const at = s + i;
-        const __m128i first = _mm_or_si128(ends(block_at(at)), ends(block_at(at + block_size)));
-        const __m128i last =
-            _mm_or_si128(ends(block_at(at + 2 * block_size)), ends(block_at(at + 3 * block_size)));
-        if (_mm_movemask_epi8(_mm_or_si128(first, last)) != 0) break;
-    }
-    for (; n - i >= block_size; i += block_size) {
-        const int places = _mm_movemask_epi8(ends(block_at(s + i)));
-        if (places != 0) return i + first_of(places);
-    }
-    if (i == n) return n;
-    // The rest lies in a block with characters that are in the run.
-    const int places = _mm_movemask_epi8(ends(block_at(s + n - block_size)));
-    return places == 0 ? n : n - block_size + first_of(places);
+// Copies the rest of a run of which the first `i` characters have been copied, one by one. In line, its loop
+// would be set up for where blocks are all there is.
+template <Run run>
+[[gnu::noinline]] std::size_t copy_rest(char* to, const char* s, std::size_t n, std::size_t i) {
+    const bool* const in_run = run == Run::plain ? characters.in_plain_run : characters.in_quoted_run;
+    for (; i < n && in_run[static_cast<unsigned char>(s[i])]; ++i) to[i] = s[i];
+    return i;
 }
 
-// The rest of a run of which the first `i` characters are known.
-std::size_t whole_run(const char* s, std::size_t n, std::size_t i, const bool* in_run) {
-    while (i < n && in_run[static_cast<unsigned char>(s[i])]) ++i;
-    return i;
+// Copies `n` characters, of which all but the last ones of a block have been copied.
+KEL_BLOCKS void copy_last(char* to, const char* s, std::size_t n) {
+    if (n >= block_size) {
+        put_block(to + n - block_size, block_at(s + n - block_size));
+    } else {
+        for (std::size_t i = 0; i < n; ++i) to[i] = s[i];
+    }
+}
+
+// Copies the run at the beginning of `n` characters, a block at least, in blocks, and four of them at once as
+// long as they are all in it. Long strings take an eighth of the time of single characters. The last block
+// lies upon others where `n` is no multiple of its size. What ends_of() tells may be in a plain run all the
+// same.
+template <Run run>
+KEL_BLOCKS std::size_t copy_blocks(char* to, const char* s, std::size_t n) {
+    std::size_t i = 0;
+    for (; n - i >= 4 * block_size; i += 4 * block_size) {
+        const __m128i a = block_at(s + i), b = block_at(s + i + block_size);
+        const __m128i c = block_at(s + i + 2 * block_size), d = block_at(s + i + 3 * block_size);
+        const __m128i some_end = _mm_or_si128(_mm_or_si128(ends_of<run>(a), ends_of<run>(b)),
+                                              _mm_or_si128(ends_of<run>(c), ends_of<run>(d)));
+        if (_mm_movemask_epi8(some_end) != 0) break;
+        put_block(to + i, a);
+        put_block(to + i + block_size, b);
+        put_block(to + i + 2 * block_size, c);
+        put_block(to + i + 3 * block_size, d);
+    }
+    for (; i < n; i += block_size) {
+        if (n - i < block_size) i = n - block_size;
+        const __m128i block = block_at(s + i);
+        if (const int places = _mm_movemask_epi8(ends_of<run>(block))) {
+            const std::size_t end = i + first_of(places);
+            copy_last(to, s, end);
+            return run == Run::plain ? copy_rest<run>(to, s, n, end) : end;
+        }
+        put_block(to + i, block);
+    }
+    return n;
+}
+
+// The run at the beginning of `n` characters.
+template <Run run>
+std::size_t copy_run(char* to, const char* s, std::size_t n) {
+    return n >= block_size && compares_blocks() ? copy_blocks<run>(to, s, n) : copy_rest<run>(to, s, n, 0);
 }
 
 }  // namespace
 
-std::size_t plain_run(const char* s, std::size_t n) {
-    const bool by_blocks = n >= block_size && compares_blocks();
-    return whole_run(s, n, by_blocks ? run_in_blocks<ends_of_plain_run>(s, n) : 0, characters.in_plain_run);
-}
-
-std::size_t quoted_run(const char* s, std::size_t n) {
-    const bool by_blocks = n >= block_size && compares_blocks();
-    return whole_run(s, n, by_blocks ? run_in_blocks<ends_of_quoted_run>(s, n) : 0, characters.in_quoted_run);
+std::size_t copy_plain_run(char* to, const char* s, std::size_t n) { return copy_run<Run::plain>(to, s, n); }
+std::size_t copy_quoted_run(char* to, const char* s, std::size_t n) {
+    return copy_run<Run::quoted>(to, s, n);
 }
 
 }  // namespace internal

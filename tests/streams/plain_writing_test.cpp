@@ -209,6 +209,15 @@ TEST(PlainWriting, ChangesNothingBehindWhatItOverwrites) {
     for (const char* s : {"", "s", "a longer string", "\x01\""}) {
         same_writing([&](KELostream& out) { out << 'c' << s; }, in_the_middle);
     }
+    for (std::size_t length = 1; length < 110; ++length) {
+        for (std::size_t escaped = 0; escaped <= length; ++escaped) {
+            std::string s(length, 'p');
+            if (escaped < length) s[escaped] = escaped % 2 == 0 ? '"' : '\x01';
+            same_writing([&](KELostream& out) { out << s.c_str(); }, in_the_middle);
+        }
+        const std::string all(length, '\x01');
+        same_writing([&](KELostream& out) { out << all.c_str(); }, in_the_middle);
+    }
     const double few[] = {1, 0.5, 1e-5};
     const long many[] = {1, -20000, 2000000000};
     same_writing([&](KELostream& out) { out.put(few, 3u).put(many, 3u); }, in_the_middle);
@@ -414,6 +423,8 @@ TEST(PlainWriting, KeepsWhatFitsWhenThereIsNoMemoryForMore) {
         [](KELostream& out) { out << 'c'; },
         [](KELostream& out) { out.putCString("a\"b\x01"); },
         [](KELostream& out) { out << "string"; },
+        [](KELostream& out) { out << "a\"longer\x01string"; },
+        [](KELostream& out) { out << "some that ends with\x01"; },
         [&](KELostream& out) { out.put(ints, 3); },
         [&](KELostream& out) { out.putCString(longer_than_a_block.c_str()); },
     };

@@ -39,39 +39,32 @@ struct Pairs {
 constexpr Pairs pairs;
 
 // Both characters of a number below 100, the first one lower.
-inline std::uint32_t pair_of_digits(std::uint64_t n) {
+inline std::uint32_t pair_of_digits(std::uint32_t n) {
     KEL_UNINITIALIZED std::uint16_t both;
     copy_bytes<2>(&both, pairs.characters[n]);
     return both;
 }
 
-// A fraction in units of 2^-32, of which the digits come out two at a time in front of the point: one
-// multiplication leaves them in one half of its result and the rest of the fraction in the other.
-inline std::uint32_t put_pair(char* at, std::uint32_t fraction) {
-    const std::uint64_t product = std::uint64_t(fraction) * 100;
-    copy_bytes<2>(at, pairs.characters[product >> 32]);
-    return static_cast<std::uint32_t>(product);
-}
+// The upper two digits of a number below 10,000, by one multiplication.
+inline std::uint32_t hundreds_of(std::uint32_t n) { return n * 5243 >> 19; }
 
-// Numbers below 10,000 and 100,000,000 with leading zeros. They become a fraction that is a little too large,
-// by less than any digit that is asked for.
+// Numbers below 10,000 and 100,000,000 with leading zeros.
 inline void put_four(char* at, std::uint32_t n) {
-    const std::uint64_t hundreds = std::uint64_t(n) * 42949673;  // 2^32 / 100, rounded up
-    copy_bytes<2>(at, pairs.characters[hundreds >> 32]);
-    put_pair(at + 2, static_cast<std::uint32_t>(hundreds));
+    const std::uint32_t hundreds = hundreds_of(n);
+    copy_bytes<2>(at, pairs.characters[hundreds]);
+    copy_bytes<2>(at + 2, pairs.characters[n - hundreds * 100]);
 }
 
 inline void put_eight(char* at, std::uint32_t n) {
-    const std::uint64_t millions = std::uint64_t(n) * 2251799814;  // 2^51 / 10^6, rounded up
-    copy_bytes<2>(at, pairs.characters[millions >> 51]);
-    const std::uint32_t fraction = static_cast<std::uint32_t>(millions >> 19) + 1;
-    put_pair(at + 6, put_pair(at + 4, put_pair(at + 2, fraction)));
+    const std::uint32_t upper = n / 10000;
+    put_four(at, upper);
+    put_four(at + 4, n - upper * 10000);
 }
 
 // The digits of a number below 10,000 without leading zeros, the first one lowest, and how many they are.
 struct UpToFour {
     explicit UpToFour(std::uint32_t n) {
-        const std::uint32_t hundreds = n * 5243 >> 19;
+        const std::uint32_t hundreds = hundreds_of(n);
         characters = pair_of_digits(hundreds) | pair_of_digits(n - hundreds * 100) << 16;
         const int zeros = __builtin_ctz((characters & 0x000f0f0f) | 1 << 24) / 8;
         characters >>= 8 * zeros;
@@ -97,13 +90,14 @@ inline char* put_up_to_two(char* at, std::uint32_t n) {
     return at + 2 - zeros;
 }
 
-// A number below 10,000: its last two digits lie upon its first two.
+// A number below 10,000: its last two digits lie upon its first two. One digit is what flags, states and most
+// counts have.
 inline char* put_up_to_four(char* at, std::uint32_t n) {
-    const UpToFour digits(n);
-    if (digits.count == 1) {
-        *at = static_cast<char>(digits.characters);
+    if (n < 10) {
+        *at = static_cast<char>('0' + n);
         return at + 1;
     }
+    const UpToFour digits(n);
     const std::uint32_t last_two = digits.characters >> 8 * (digits.count - 2);
     copy_bytes<2>(at, &digits.characters);
     copy_bytes<2>(at + digits.count - 2, &last_two);
@@ -157,17 +151,18 @@ inline char* show_integer(char* at, std::uint64_t n) {
     const std::uint32_t upper = static_cast<std::uint32_t>(n >> 32);
     const std::uint32_t lower = static_cast<std::uint32_t>(n);
     if (upper == 0) return show_integer(at, lower);
-    KEL_UNINITIALIZED const LastEight ends(upper % eight_digits, lower);
     if (upper < eight_digits) {
+        KEL_UNINITIALIZED const LastEight ends(upper, lower);
         at = show_integer(at, ends.first);
-    } else {
-        KEL_UNINITIALIZED const LastEight middle(upper / eight_digits, ends.first);
-        at = show_integer(at, middle.first);
-        put_eight(at, middle.last);
-        at += 8;
+        put_eight(at, ends.last);
+        return at + 8;
     }
-    put_eight(at, ends.last);
-    return at + 8;
+    KEL_UNINITIALIZED const LastEight ends(upper % eight_digits, lower);
+    KEL_UNINITIALIZED const LastEight middle(upper / eight_digits, ends.first);
+    at = show_integer(at, middle.first);
+    put_eight(at, middle.last);
+    put_eight(at + 8, ends.last);
+    return at + 16;
 }
 
 // Every other integer as the smallest of the two above that holds it.

@@ -3,7 +3,7 @@
 //
 //   is_plain          good, with the flags, width and locale that streams are born with, and no observer
 //   is_over_string    reads or writes a std::stringbuf and nothing derived from it
-//   is_plain_string   both at once
+//   plain_string      the buffer of a stream of which both hold, which then has one; null of any other
 //
 // Only a std::stringbuf is known well enough to be given several pieces as one: no derived class sees the
 // calls, nothing but lack of memory stops it, and then it holds every character there was room for.
@@ -61,7 +61,9 @@ inline bool is_over_string(const std::ios& stream) {
     return &typeid(buffer) == &typeid(std::stringbuf);
 }
 
-inline bool is_plain_string(const std::ios& stream) { return is_plain(stream) && is_over_string(stream); }
+inline std::streambuf* plain_string(const std::ios& stream) {
+    return is_plain(stream) && is_over_string(stream) ? stream.rdbuf() : nullptr;
+}
 
 }  // namespace internal
 }  // namespace kel

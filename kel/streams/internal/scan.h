@@ -52,20 +52,21 @@ public:
     // time.
     template <int most>
     int read_digits(std::uint32_t& number) {
-        number = 0;
-        const int room = _end - _at < most ? static_cast<int>(_end - _at) : most;
+        std::uint32_t value = 0;
         int n = 0;
-        if (room == most) {
+        if (_end - _at >= most) {
 #pragma GCC unroll 9
             for (; n != most; ++n) {
                 const unsigned digit = digit_at(n);
                 if (digit >= 10) break;
-                number = number * 10 + digit;
+                value = value * 10 + digit;
             }
         } else {
-            for (unsigned digit; n != room && (digit = digit_at(n)) < 10; ++n) number = number * 10 + digit;
+            const int room = static_cast<int>(_end - _at);
+            for (unsigned digit; n != room && (digit = digit_at(n)) < 10; ++n) value = value * 10 + digit;
         }
         _at += n;
+        number = value;
         return n;
     }
 
@@ -122,9 +123,10 @@ std::uint64_t largest(bool negative) {
 // A number that may be too large, of which `number` has the first digits, as many as always fit: one digit
 // more where they are nine. With more still it is too large or begins with zeros.
 template <class T>
-std::enable_if_t<sizeof(T) <= 4, bool> scan_rest(Scan& scan, bool negative, std::uint64_t number, T& value) {
+std::enable_if_t<sizeof(T) <= 4, bool> scan_rest(Scan& scan, bool negative, std::uint32_t number, T& value) {
     if (scan.digit() < 10) {
-        number = number * 10 + scan.digit();
+        if (__builtin_mul_overflow(number, 10u, &number)) return false;
+        if (__builtin_add_overflow(number, scan.digit(), &number)) return false;
         scan.advance();
     }
     if (scan.at_end() || scan.digit() < 10 || number > largest<T>(negative)) return false;

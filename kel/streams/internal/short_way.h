@@ -40,14 +40,13 @@ inline char* show(const std::ios_base&, char* at, char c) {
 
 template <class T>
 bool show_in_memory(std::ostream& out, const T& value) {
-    if (!is_plain_string(out)) return false;
-    std::streambuf& string = *out.rdbuf();
-    if (WriteArea::room(string) <= longest_value) return false;
-    char* const begin = WriteArea::begin(string);
+    std::streambuf* const string = plain_string(out);
+    if (string == nullptr || WriteArea::room(*string) <= longest_value) return false;
+    char* const begin = WriteArea::begin(*string);
     char* const end = show(out, begin, shown(value));
     if (std::is_floating_point_v<T> && end == nullptr) return false;
     *end = ' ';
-    WriteArea::fill_few(string, static_cast<int>(end + 1 - begin));
+    WriteArea::fill_few(*string, static_cast<int>(end + 1 - begin));
     return true;
 }
 
@@ -72,11 +71,9 @@ inline bool scan_next(Scan& scan, char& c) {
     return !scan.at_end();
 }
 
-// A value and `behind` characters after it, one or none.
+// A value and `behind` characters after it, one or none, from the string of a plain stream.
 template <int behind, class T>
-bool scan_in_memory(std::istream& in, T& value) {
-    if (!is_plain_string(in)) return false;
-    std::streambuf& string = *in.rdbuf();
+bool scan_in_string(std::istream& in, std::streambuf& string, T& value) {
     const char* const begin = ReadArea::begin(string);
     KEL_UNINITIALIZED Scan scan(begin, ReadArea::end(string));
     scan.skip_blanks();
@@ -84,6 +81,13 @@ bool scan_in_memory(std::istream& in, T& value) {
     ReadArea::consume(string, scan.at() + behind - begin);
     if (behind > 0) InputCount::set(in, behind);
     return true;
+}
+
+// The same of any stream.
+template <int behind, class T>
+bool scan_in_memory(std::istream& in, T& value) {
+    std::streambuf* const string = plain_string(in);
+    return string != nullptr && scan_in_string<behind>(in, *string, value);
 }
 
 // Reads a value in the shortest way that it has.
