@@ -42,6 +42,14 @@ std::string outcome(Work work) {
     }
 }
 
+// Whether a buffer's writer has stayed in its room.
+inline bool writes_in_its_room(const std::streambuf& buffer) {
+    struct Areas : std::streambuf {
+        static bool hold(const std::streambuf& b) { return (b.*(&Areas::pptr))() <= (b.*(&Areas::epptr))(); }
+    };
+    return Areas::hold(buffer);
+}
+
 typedef std::function<void(std::ios&)> Dress;  // makes a stream less plain, or fails it
 
 inline void undressed(std::ios&) {}
@@ -56,6 +64,7 @@ std::string written_by(Work work, const Dress& dress, bool ordinary) {
     dress(text);
     KELostream out(text);
     const std::string end = outcome([&] { work(out); });
+    EXPECT_TRUE(writes_in_its_room(*text.rdbuf()));
     return end + ", " + seen(text) + ", offset " + std::to_string(out.cur_out_offset()) + ": " + text.str();
 }
 
