@@ -129,8 +129,8 @@ const Factories& factories() {
     return all;
 }
 
-// Both ends of a connection. It stays: a hundred exceptions are sent over it and received, then it starts
-// over, so that one exception is what is measured and not the going back.
+// Both ends of a connection, which stays with its streams: a hundred exceptions are sent over it and
+// received, then it starts over. So one exception is what is measured, and not the going back.
 const int batch = 100;
 
 struct Standard {
@@ -175,7 +175,7 @@ void there_and_back(benchmark::State& state) {
         for (int i = 0; i < batch; ++i) connection.send();
         for (int i = 0; i < batch; ++i) connection.receive();
     }
-    state.counters["items"] = batch;
+    state.counters["items"] = batch;  // the time is that of one, as for the limit
 }
 
 // The least: the same bytes copied there and back, one object made.

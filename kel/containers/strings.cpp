@@ -37,7 +37,8 @@ char* alloc_empty(unsigned long len) {
     return s;
 }
 
-// Not in line: its variable would have the reading of text watch the stack as well.
+// Not in line: for this variable, whose address is taken, the compiler would have text guard its stack as
+// well.
 __attribute__((noinline)) unsigned long read_length(KEListream& in) {
     unsigned long n = 0;
     in >> n;

@@ -186,7 +186,7 @@ KEListream& operator>>(KEListream& in, CORBA_Exception*& e) {
     e = nullptr;
     if (_excepDict == nullptr) throw CORBA_BAD_INV_ORDER(4, CORBA::COMPLETED_MAYBE);
 
-    CORBA_String_var id(static_cast<char*>(nullptr));
+    CORBA_String_var id(static_cast<char*>(nullptr));  // in line, which the empty string is not
     in >> id;
     CORBA_Exception::Description* found = nullptr;
     _excepDict->atKey(KELStringWrapper(id.in()), found);

@@ -13,6 +13,7 @@
 #include <new>
 
 using kel::internal::assertion_failed;
+using kel::internal::copy_bytes;
 using kel::internal::longest_integer;
 using kel::internal::show_integer;
 
@@ -59,14 +60,13 @@ struct TimeText {
 TimeText last_time;
 bool last_time_taken;  // by a thread; others do without it, and so does a child whose parent's thread had it
 
-// What ctime has for `now` without its newline, or nothing.
+// Both fill `time_room` characters with what ctime has for `now` without its newline, or nothing.
 void make_time_text(std::time_t now, char* text) {
     tzset();  // ctime_r, unlike ctime, need not look at a changed TZ
     if (ctime_r(&now, text) == nullptr) text[0] = '\0';
     text[time_length] = '\0';
 }
 
-// Fills `time_room` characters.
 void local_time_text(std::time_t now, char* text) {
     const char* zone = std::getenv("TZ");
     if (zone == nullptr) zone = no_zone;
@@ -233,8 +233,8 @@ bool KELDebugLogger::prints(unsigned int module, int group) const {
 // longer than the system takes to write it.
 void KELDebugLogger::print_header(unsigned int level, unsigned int module, const char* file, int line) {
     const std::time_t now = std::time(nullptr);
-    const std::size_t length = file != nullptr ? std::strlen(file) : longest_short_name + 1;
-    if (length > longest_short_name) {
+    const std::size_t length = file != nullptr ? std::strlen(file) : 0;
+    if (file == nullptr || length > longest_short_name) {
         char text[time_room];
         local_time_text(now, text);
         std::fprintf(_fp, "=> %s,%02x,%08x,%s,%d,%d\n", text, level, module, file, line,
@@ -242,7 +242,7 @@ void KELDebugLogger::print_header(unsigned int level, unsigned int module, const
         return;
     }
     KEL_UNINITIALIZED char header[longest_short_name + 100];
-    std::memcpy(header, "=> ", 3);
+    copy_bytes<3>(header, "=> ");
     char* at = header + 3;
     local_time_text(now, at);
     if (*at != '\0') at += time_length;

@@ -42,8 +42,7 @@ const ClassicLocale classic_locale;
 namespace kel {
 namespace internal {
 
-constexpr Consoles addresses{&std::cin, &std::cout, &std::cerr, &std::clog};
-const Consoles consoles = addresses;
+constexpr Consoles consoles{&std::cin, &std::cout, &std::cerr, &std::clog};
 std::ostream& error_stream() { return std::cerr; }
 
 void no_standard_stream(const char* operations) {

@@ -221,11 +221,15 @@ bool takes_room(int c) { return c != '"' && c != '\n' && c != end_of_input; }
     to.offset += 1;
 }
 
-// Reads a quoted string into a new one. What a stream throws leaves that empty: nobody could tell what has
-// been stored from what its memory held before.
-[[gnu::noinline]] void read_into(KEListream& in, char* s, std::uint32_t length) {
+// Reads a quoted string into a new one: from memory when no virtual function is to be asked. What a stream
+// throws leaves that empty: nobody could tell what has been stored from what its memory held before.
+[[gnu::noinline]] void read_into(KEListream& stream, char* s, std::uint32_t length, bool from_memory) {
     try {
-        in.getCString(s, length);
+        if (from_memory) {
+            read_quoted(*stream._strm, {s, length, stream._offset});
+        } else {
+            stream.getCString(s, length);
+        }
     } catch (...) {
         s[0] = '\0';
         throw;
@@ -247,7 +251,7 @@ bool takes_room(int c) { return c != '"' && c != '\n' && c != end_of_input; }
         stream._offset += 1;
     } else if (in.peek() == '"') {
         s = new_string(2);  // the quotes are trusted for no more than the two bytes of this room
-        read_into(stream, s, 2);
+        read_into(stream, s, 2, false);
     } else {
         in.get();
         s = new_string(0);
@@ -286,10 +290,10 @@ KEL_FLATTEN KEListream& KEListream::operator>>(char*& s) {
         return *this;
     }
     s = new_string(length);
-    const bool taken =
-        in_memory && has_own_functions(*this) && take_whole_string(in, *string, s, length, _offset);
+    const bool from_memory = in_memory && has_own_functions(*this);
+    const bool taken = from_memory && take_whole_string(in, *string, s, length, _offset);
     if (taken && another_comes_next(in, *string, '\n')) return *this;
-    if (!taken) read_into(*this, s, length);
+    if (!taken) read_into(*this, s, length, from_memory);
     // Deliberate: a newline here is taken even when the string had room for its terminator and the
     // newline is the next item's. Pinned by StringReading.ANewlineBehindTheStringIsTaken.
     if (in.peek() == '\n') {

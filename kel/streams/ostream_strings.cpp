@@ -36,7 +36,7 @@ char escape_letter(char c) {
     return 0;
 }
 
-constexpr std::size_t longest_escape = 4;
+constexpr int longest_escape = 4;
 
 // One character as it stands in a quoted string: 1 to 4 characters. Gives their end.
 char* show_quoted(char* at, char c) {
@@ -88,21 +88,26 @@ char* show_quoted_runs(char* at, const char* end, const char* s, std::size_t n) 
     return at;
 }
 
-// The same of a plain stream over a string, which makes room. Returns the number of characters: what is
-// refused because there is no memory counts all the same.
+// Writes the quoted form to a plain stream over a string, which makes room where there is none. Returns the
+// number of its characters: what is refused because there is no memory counts all the same.
 std::size_t write_quoted_runs(std::ostream& out, const char* s, std::size_t n) {
     std::streambuf& string = *out.rdbuf();
     std::size_t count = quotes_and_newline;
     out.put('"');
     while (n > 0) {
-        const std::size_t room = out.good() ? WriteArea::room(string) : 0;
-        const std::size_t run = copy_plain_run(WriteArea::begin(string), s, std::min(n, room));
-        WriteArea::fill(string, run);
+        char* const begin = WriteArea::begin(string);
+        char* const end = out.good() ? WriteArea::end(string) : begin;
+        const std::size_t run = copy_plain_run(begin, s, std::min(n, static_cast<std::size_t>(end - begin)));
+        char* at = begin + run;
         s += run;
         n -= run;
-        count += run;
+        const bool fits = n > 0 && end - at >= longest_escape;
+        if (fits) at = show_quoted(at, *s);
+        WriteArea::fill(string, static_cast<std::size_t>(at - begin));
+        count += static_cast<std::size_t>(at - begin);
         if (n == 0) break;
-        count += write_quoted(out, *s++);
+        if (!fits) count += write_quoted(out, *s);
+        ++s;
         --n;
     }
     out.put('"').put('\n');

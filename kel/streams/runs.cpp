@@ -34,7 +34,7 @@ constexpr std::size_t block_size = 16;
 
 // Every x86-64 processor compares sixteen characters at once, and every 32-bit one that tells so.
 #ifdef __x86_64__
-bool compares_blocks() { return true; }
+inline bool compares_blocks() { return true; }
 #else
 enum class Sse2 { not_asked, absent, present };
 
@@ -57,6 +57,14 @@ inline bool compares_blocks() {
 #endif
 
 #define KEL_BLOCKS __attribute__((target("sse2")))
+
+// Blocks that do not fit into registers are kept on the stack, which a 32-bit program may have aligned to
+// four bytes only.
+#ifdef __i386__
+#define KEL_ALIGN_STACK __attribute__((force_align_arg_pointer))
+#else
+#define KEL_ALIGN_STACK
+#endif
 
 KEL_BLOCKS __m128i block_at(const char* s) { return _mm_loadu_si128(reinterpret_cast<const __m128i*>(s)); }
 KEL_BLOCKS __m128i equal(__m128i block, char c) { return _mm_cmpeq_epi8(block, _mm_set1_epi8(c)); }
@@ -96,7 +104,8 @@ template <Run run>
     return i;
 }
 
-// Copies `n` characters, of which all but the last ones of a block have been copied.
+// Copies the last block of `n` characters, where those before it have been copied; all of them where they are
+// less than a block.
 KEL_BLOCKS void copy_last(char* to, const char* s, std::size_t n) {
     if (n >= block_size) {
         put_block(to + n - block_size, block_at(s + n - block_size));
@@ -110,7 +119,7 @@ KEL_BLOCKS void copy_last(char* to, const char* s, std::size_t n) {
 // lies upon others where `n` is no multiple of its size. What ends_of() tells may be in a plain run all the
 // same.
 template <Run run>
-KEL_BLOCKS std::size_t copy_blocks(char* to, const char* s, std::size_t n) {
+KEL_BLOCKS KEL_ALIGN_STACK std::size_t copy_blocks(char* to, const char* s, std::size_t n) {
     std::size_t i = 0;
     for (; n - i >= 4 * block_size; i += 4 * block_size) {
         const __m128i a = block_at(s + i), b = block_at(s + i + block_size);

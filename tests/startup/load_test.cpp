@@ -23,6 +23,12 @@ TEST(Load, TraceIsPrintedWhileTheLibraryIsOpened) {
     EXPECT_EQ(o.out.substr(o.out.size() - 20), "\nthreads 1\nresident\n");
 }
 
+TEST(Load, ProgramsOfAnOlderKindGoOnWorking) {
+    const Outcome o = start({"old_style"}, {"DEBUG_STATIC"});
+    EXPECT_EQ(o.out, "factories agree\ntexts agree\n");
+    EXPECT_EQ(o.exit_code, 0);
+}
+
 TEST(Plugin, ExceptionIsRegisteredWhileItsLibraryIsLoaded) {
     const Outcome o = start({"plugin_host", KEL_STARTUP_PLUGIN, "visit", "1"}, {"DEBUG_STATIC"});
     EXPECT_EQ(o.out, "registered\ncaught PluginError\ngone\n");
