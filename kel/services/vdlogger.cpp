@@ -50,37 +50,57 @@ const std::size_t time_length = 24;  // of its text without the newline
 const std::size_t longest_zone = 63;
 const char no_zone[] = "\n";  // stands for a TZ that is not set, which is another zone than an empty one
 
-// The last text and what it was made from. Looking a zone up can take as long as writing the entry, so
+// What a header has of a time.
+struct TimeTexts {
+    char date[time_room];          // of ctime without its newline, or empty
+    char number[longest_integer];  // the seconds, with a newline
+    int number_length;
+};
+
+// The last texts and what they were made from. Looking a zone up can take as long as writing the entry, so
 // it is done once a second, and at once when TZ changes.
-struct TimeText {
+struct LastTime {
     std::time_t time;
     char zone[longest_zone + 1];
-    char text[time_room];  // empty while there is none
+    TimeTexts texts;  // of an empty date while there are none
 };
-TimeText last_time;
+LastTime last_time;
 bool last_time_taken;  // by a thread; others do without it, and so does a child whose parent's thread had it
 
-// Both fill `time_room` characters with what ctime has for `now` without its newline, or nothing.
-void make_time_text(std::time_t now, char* text) {
+void make_time_texts(std::time_t now, TimeTexts& texts) {
     tzset();  // ctime_r, unlike ctime, need not look at a changed TZ
-    if (ctime_r(&now, text) == nullptr) text[0] = '\0';
-    text[time_length] = '\0';
+    if (ctime_r(&now, texts.date) == nullptr) texts.date[0] = '\0';
+    texts.date[time_length] = '\0';
+    char* const end = show_integer(texts.number, static_cast<int>(now));
+    *end = '\n';
+    texts.number_length = static_cast<int>(end + 1 - texts.number);
 }
 
-void local_time_text(std::time_t now, char* text) {
+// A TZ that is not set is the usual case, and no text to be compared.
+bool is_last_zone(const char* zone) {
+    if (zone == no_zone) return last_time.zone[0] == *no_zone;
+    return std::strcmp(last_time.zone, zone) == 0;
+}
+
+// Nothing is kept of a zone that is too long.
+void local_time_texts(std::time_t now, TimeTexts& texts) {
     const char* zone = std::getenv("TZ");
     if (zone == nullptr) zone = no_zone;
-    const std::size_t length = strnlen(zone, longest_zone + 1);
-    if (length > longest_zone || __atomic_test_and_set(&last_time_taken, __ATOMIC_ACQUIRE)) {
-        make_time_text(now, text);
+    if (__atomic_test_and_set(&last_time_taken, __ATOMIC_ACQUIRE)) {
+        make_time_texts(now, texts);
         return;
     }
-    if (last_time.time != now || last_time.text[0] == '\0' || std::strcmp(last_time.zone, zone) != 0) {
-        make_time_text(now, last_time.text);
-        last_time.time = now;
-        std::memcpy(last_time.zone, zone, length + 1);
+    if (last_time.time == now && last_time.texts.date[0] != '\0' && is_last_zone(zone)) {
+        texts = last_time.texts;
+    } else {
+        make_time_texts(now, texts);
+        const std::size_t length = strnlen(zone, longest_zone + 1);
+        if (length <= longest_zone) {
+            last_time.time = now;
+            std::memcpy(last_time.zone, zone, length + 1);
+            last_time.texts = texts;
+        }
     }
-    std::memcpy(text, last_time.text, time_room);
     __atomic_clear(&last_time_taken, __ATOMIC_RELEASE);
 }
 
@@ -229,35 +249,33 @@ bool KELDebugLogger::prints(unsigned int module, int group) const {
     return (read_word(_masks[group]) & module) != 0 || (read_word(_masks[0]) & trace_all_bit) != 0;
 }
 
-// A name of the common length makes a header that is put together here. Printing it by its format takes
-// longer than the system takes to write it.
+// As "=> %s,%02x,%08x,%s,%d,%d\n" would print it, which takes longer than the system takes to write it.
 void KELDebugLogger::print_header(unsigned int level, unsigned int module, const char* file, int line) {
-    const std::time_t now = std::time(nullptr);
-    const std::size_t length = file != nullptr ? std::strlen(file) : 0;
-    if (file == nullptr || length > longest_short_name) {
-        char text[time_room];
-        local_time_text(now, text);
-        std::fprintf(_fp, "=> %s,%02x,%08x,%s,%d,%d\n", text, level, module, file, line,
-                     static_cast<int>(now));
-        return;
-    }
+    KEL_UNINITIALIZED TimeTexts now;
+    local_time_texts(std::time(nullptr), now);
     KEL_UNINITIALIZED char header[longest_short_name + 100];
     copy_bytes<3>(header, "=> ");
     char* at = header + 3;
-    local_time_text(now, at);
-    if (*at != '\0') at += time_length;
+    copy_bytes<time_length>(at, now.date);
+    if (now.date[0] != '\0') at += time_length;
     *at++ = ',';
     at = put_hexadecimal(at, level, 2);
     *at++ = ',';
     at = put_hexadecimal(at, module, 8);
     *at++ = ',';
-    std::memcpy(at, file, length);
-    at += length;
+
+    const char* name = file != nullptr ? file : "(null)";
+    for (std::size_t n = 0; *name != '\0' && n != longest_short_name; ++n) *at++ = *name++;
+    if (*name != '\0') {
+        std::fwrite(header, 1, static_cast<std::size_t>(at - header), _fp);
+        std::fputs(name, _fp);
+        at = header;
+    }
     *at++ = ',';
     at = show_integer(at, line);
     *at++ = ',';
-    at = show_integer(at, static_cast<int>(now));
-    *at++ = '\n';
+    copy_bytes<longest_integer>(at, now.number);
+    at += now.number_length;
     std::fwrite(header, 1, static_cast<std::size_t>(at - header), _fp);
 }
 
