@@ -71,7 +71,10 @@ function(kel_library_options target)
   # fifths of the names that are looked up when it is loaded, a quarter of its part of that time. Data and
   # the functions that are listed have one address in the whole process all the same.
   set(compared ${PROJECT_SOURCE_DIR}/cmake/KelComparedAddresses.list)
-  target_compile_options(${target} PRIVATE -fno-semantic-interposition -fno-plt)
+  target_compile_options(${target} PRIVATE -fno-plt)
+  if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU")  # clang++ would take addresses within the library as well
+    target_compile_options(${target} PRIVATE -fno-semantic-interposition)
+  endif()
   target_link_options(${target} PRIVATE -Wl,--dynamic-list-data -Wl,--dynamic-list=${compared})
   set_property(TARGET ${target} APPEND PROPERTY LINK_DEPENDS ${compared})
   foreach(flag relro now noexecstack nodelete separate-code)
