@@ -92,7 +92,7 @@ unsigned long CORBA::hash(const char* s) {
     return h & 0x7fffffff;
 }
 
-CORBA_String_var::CORBA_String_var() : _ptr(kEmptyString), _capacity(0) {}
+CORBA_String_var::CORBA_String_var() noexcept : _ptr(kEmptyString), _capacity(0) {}
 
 CORBA_String_var::CORBA_String_var(const char* s)
     : _ptr(CORBA::string_dup(s)), _capacity(s != 0 ? std::strlen(s) + 1 : 0) {}

@@ -62,7 +62,7 @@ using IfPointer = typename std::enable_if<std::is_same<P, Character*>::value>::t
 class KEL_API CORBA_String_var {
 public:
     // Holds an empty string that costs no memory.
-    CORBA_String_var();
+    CORBA_String_var() noexcept;
 
     // Takes `p`, a char*, over; it may be null.
     template <class P, class = kel::internal::IfPointer<P, char>>

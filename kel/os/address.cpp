@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: MIT
 #include <arpa/inet.h>
+#include <kel/core/internal/digits.h>
 #include <kel/core/portlib.h>
 #include <kel/exceptions/standard.h>
 #include <kel/os/address.h>
@@ -8,7 +9,6 @@
 #include <net/if.h>
 #include <netinet/in.h>
 
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <new>
@@ -63,8 +63,8 @@ unsigned scope_of_link_local() {
 
 addrinfo* Getaddrinfo(const char* host, int port, int socktype, unsigned char transient) {
     if (host == nullptr || *host == '\0') return new_wildcard_list(port, socktype);
-    char service[16];
-    std::snprintf(service, sizeof service, "%u", static_cast<unsigned>(port));
+    char service[kel::internal::longest_integer + 1];
+    *kel::internal::show_integer(service, static_cast<unsigned>(port)) = '\0';
     addrinfo hints = addrinfo();
     hints.ai_family = AF_UNSPEC;
     hints.ai_socktype = socktype;

@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: MIT
 #include <kel/core/internal/attributes.h>
+#include <kel/core/internal/digits.h>
 #include <kel/core/internal/failure.h>
 #include <kel/services/debug_logger.h>
-#include <kel/streams/internal/digits.h>
 #include <sys/stat.h>
 #include <unistd.h>
 

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: MIT
 #include <kel/core/internal/attributes.h>
+#include <kel/core/internal/digits.h>
 #include <kel/streams/internal/decimals.h>
-#include <kel/streams/internal/digits.h>
 
 #include <cfenv>
 #include <cstring>

@@ -65,8 +65,6 @@ KEListream& KEListream::operator=(const KEListream&) { return *this; }
 
 KEListream::~KEListream() { TableList(*this).release(); }
 
-unsigned char KEListream::istrm_is_null() const { return _strm == nullptr; }
-
 void KEListream::reset() {
     TableList(*this).reset();
     _offset = 0;

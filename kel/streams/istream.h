@@ -49,7 +49,7 @@ public:
     virtual ~KEListream();
 
     // 1 when there is no standard stream, so that a reader can choose the binary form.
-    unsigned char istrm_is_null() const;
+    unsigned char istrm_is_null() const { return _strm == nullptr; }
 
     // Empties every table that is in use and sets the offset to 0. The tables stay attached.
     virtual void reset();

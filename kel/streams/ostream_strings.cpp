@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: MIT
+#include <kel/core/internal/digits.h>
 #include <kel/streams/internal/areas.h>
 #include <kel/streams/internal/console.h>
-#include <kel/streams/internal/digits.h>
 #include <kel/streams/internal/escapes.h>
 #include <kel/streams/internal/own_functions.h>
 #include <kel/streams/internal/plain.h>

@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: MIT
 #include <kel/core/internal/attributes.h>
+#include <kel/core/internal/digits.h>
 #include <kel/streams/internal/areas.h>
 #include <kel/streams/internal/decimals.h>
-#include <kel/streams/internal/digits.h>
 #include <kel/streams/internal/plain.h>
 #include <kel/streams/internal/scan.h>
 #include <kel/streams/internal/short_way.h>

@@ -32,27 +32,26 @@ constexpr Characters characters = told_apart();
 
 constexpr std::size_t block_size = 16;
 
-// Every x86-64 processor compares sixteen characters at once, and every 32-bit one that tells so.
+// Every x86-64 processor compares sixteen characters at once, and every 32-bit one that tells so. It is asked
+// when that is not known, apart from the short way of a run.
 #ifdef __x86_64__
-inline bool compares_blocks() { return true; }
+inline bool known_to_compare_blocks() { return true; }
+inline bool found_to_compare_blocks() { return true; }
 #else
 enum class Sse2 { not_asked, absent, present };
 
 // No static of a function: a look at its guard, in a call, would take as long as a block.
 std::atomic<Sse2> sse2{Sse2::not_asked};
 
-[[gnu::cold, gnu::noinline]] Sse2 ask_for_sse2() {
-    unsigned a, b, c, d;
-    const bool has_it = __get_cpuid(1, &a, &b, &c, &d) != 0 && (d & bit_SSE2) != 0;
-    const Sse2 answer = has_it ? Sse2::present : Sse2::absent;
-    sse2.store(answer, std::memory_order_relaxed);
-    return answer;
-}
+inline bool known_to_compare_blocks() { return sse2.load(std::memory_order_relaxed) == Sse2::present; }
 
-inline bool compares_blocks() {
-    Sse2 answer = sse2.load(std::memory_order_relaxed);
-    if (answer == Sse2::not_asked) answer = ask_for_sse2();
-    return answer == Sse2::present;
+[[gnu::cold]] bool found_to_compare_blocks() {
+    if (sse2.load(std::memory_order_relaxed) == Sse2::not_asked) {
+        unsigned a, b, c, d;
+        const bool has_it = __get_cpuid(1, &a, &b, &c, &d) != 0 && (d & bit_SSE2) != 0;
+        sse2.store(has_it ? Sse2::present : Sse2::absent, std::memory_order_relaxed);
+    }
+    return known_to_compare_blocks();
 }
 #endif
 
@@ -145,10 +144,17 @@ KEL_BLOCKS KEL_ALIGN_STACK std::size_t copy_blocks(char* to, const char* s, std:
     return n;
 }
 
+template <Run run>
+[[gnu::noinline]] std::size_t copy_otherwise(char* to, const char* s, std::size_t n) {
+    return n >= block_size && found_to_compare_blocks() ? copy_blocks<run>(to, s, n)
+                                                        : copy_rest<run>(to, s, n, 0);
+}
+
 // The run at the beginning of `n` characters.
 template <Run run>
 std::size_t copy_run(char* to, const char* s, std::size_t n) {
-    return n >= block_size && compares_blocks() ? copy_blocks<run>(to, s, n) : copy_rest<run>(to, s, n, 0);
+    return n >= block_size && known_to_compare_blocks() ? copy_blocks<run>(to, s, n)
+                                                        : copy_otherwise<run>(to, s, n);
 }
 
 }  // namespace

@@ -12,9 +12,9 @@
 #define KEL_STREAMS_INTERNAL_SHORT_WAY_H
 
 #include <kel/core/internal/attributes.h>
+#include <kel/core/internal/digits.h>
 #include <kel/streams/internal/areas.h>
 #include <kel/streams/internal/decimals.h>
-#include <kel/streams/internal/digits.h>
 #include <kel/streams/internal/plain.h>
 #include <kel/streams/internal/scan.h>
 #include <kel/streams/internal/text.h>

@@ -6,8 +6,8 @@
 // Digits are looked up two at a time, and put together in one word where it matters how many they are.
 //
 // SPDX-License-Identifier: MIT
-#ifndef KEL_STREAMS_INTERNAL_DIGITS_H
-#define KEL_STREAMS_INTERNAL_DIGITS_H
+#ifndef KEL_CORE_INTERNAL_DIGITS_H
+#define KEL_CORE_INTERNAL_DIGITS_H
 
 #include <kel/core/internal/attributes.h>
 
