@@ -56,14 +56,27 @@ int tens_in_two_to(int power) { return power * 78913 >> 18; }
 // cut off and a product that is cut off each take away less than one: that is all the error there is.
 struct Rounded {
     Rounded(std::uint64_t bits, int surplus)
-        : whole(bits >> surplus), decided((bits & ((one << surplus) - 1)) - (half(surplus) - 1) > 1) {
-        if ((bits >> (surplus - 1) & 1) != 0) ++whole;
-    }
+        : whole((bits >> surplus) + (bits >> (surplus - 1) & 1)),
+          decided((bits & ((one << surplus) - 1)) - (half(surplus) - 1) > 1) {}
     static constexpr std::uint64_t one = 1;
     static constexpr std::uint64_t half(int surplus) { return one << (surplus - 1); }
 
     std::uint64_t whole;
     bool decided;  // the number is not so close to the middle that its error matters
+};
+
+// The same where the upper half of the number has the last bit that stays and `surplus` more: one word takes
+// a third of the steps at 32 bits.
+struct RoundedInUpperHalf {
+    RoundedInUpperHalf(std::uint64_t bits, int surplus) {
+        const std::uint32_t half = std::uint32_t(1) << (surplus - 1);
+        const std::uint32_t rest = upper_half(bits) & (2 * half - 1);
+        whole = (upper_half(bits) >> surplus) + (rest >> (surplus - 1));
+        decided = (std::uint64_t(rest - half) << 32 | lower_half(bits)) + 1 > 1;
+    }
+
+    std::uint32_t whole;
+    bool decided;
 };
 
 // The C library rounds as the thread has told the processor to. Asked as std::fegetround does, whose call
@@ -115,16 +128,29 @@ FewCharacters significant_digits(std::uint32_t six) {
     const std::uint32_t four = pair_of_digits(first) | pair_of_digits(second) << 16;
     const std::uint32_t two = pair_of_digits(last_four - second * 100);
     const std::uint64_t word = std::uint64_t(two) << 32 | four;
-    return {word, 8 - __builtin_clzll(word & 0x0f0f0f0f0f0f) / 8};
+    const unsigned zeros = static_cast<unsigned>(__builtin_clzll(word & 0x0f0f0f0f0f0f)) / 8;
+    return {word, static_cast<int>(8 - zeros)};
 }
+
+// For a point behind so many characters: what stands before it, and itself.
+struct Points {
+    constexpr Points() : whole(), point() {
+        for (int before = 0; before < shown_digits; ++before) {
+            whole[before] = (std::uint64_t(1) << 8 * before) - 1;
+            point[before] = std::uint64_t('.') << 8 * before;
+        }
+    }
+    std::uint64_t whole[shown_digits];
+    std::uint64_t point[shown_digits];
+};
+constexpr Points points;
 
 // The same with a point behind the first `before` digits, where others follow; with zeros up to there
 // otherwise.
 FewCharacters with_point(FewCharacters digits, int before) {
     if (digits.count <= before) return {digits.word, before};
-    const std::uint64_t fraction = ~std::uint64_t(0) << 8 * before;
-    const std::uint64_t point = std::uint64_t('.') << 8 * before;
-    return {(digits.word & ~fraction) | point | (digits.word & fraction) << 8, digits.count + 1};
+    const std::uint64_t whole = digits.word & points.whole[before];
+    return {whole | points.point[before] | (digits.word ^ whole) << 8, digits.count + 1};
 }
 
 // "0.", and more zeros: two to five characters. One character more may be spoilt behind two.
@@ -161,10 +187,10 @@ bool six_digits(std::uint64_t bits, int top, std::uint32_t& six, int& exponent) 
         const int power = shown_digits - 1 - exponent;
         if (power < -largest_power || power > largest_power) return false;
         const std::uint64_t scaled = high_product(bits, significand_of_power(power));
-        const int surplus = 62 - top - twos_in_ten_to(power);
-        if (scaled >> surplus >= smallest_above) continue;
-        KEL_UNINITIALIZED const Rounded rounded(scaled, surplus);
-        six = static_cast<std::uint32_t>(rounded.whole);
+        const int surplus = 30 - top - twos_in_ten_to(power);  // six or seven digits are less than 25 bits
+        if (upper_half(scaled) >> surplus >= smallest_above) continue;
+        KEL_UNINITIALIZED const RoundedInUpperHalf rounded(scaled, surplus);
+        six = rounded.whole;
         if (six == smallest_above) {
             six = smallest_shown;
             ++exponent;

@@ -104,13 +104,18 @@ inline char* put_up_to_four(char* at, std::uint32_t n) {
     return at + digits.count;
 }
 
+// The halves of a number.
+inline std::uint32_t upper_half(std::uint64_t n) { return static_cast<std::uint32_t>(n >> 32); }
+inline std::uint32_t lower_half(std::uint64_t n) { return static_cast<std::uint32_t>(n); }
+
 // The upper half of a product, from the four products of halves: nothing wider is needed at 32 bits.
+inline std::uint64_t product(std::uint32_t a, std::uint32_t b) { return std::uint64_t(a) * b; }
 inline std::uint64_t high_product(std::uint64_t a, std::uint64_t b) {
-    const std::uint64_t a1 = a >> 32, a0 = static_cast<std::uint32_t>(a);
-    const std::uint64_t b1 = b >> 32, b0 = static_cast<std::uint32_t>(b);
-    const std::uint64_t cross = a1 * b0 + (a0 * b0 >> 32);
-    const std::uint64_t other = a0 * b1 + static_cast<std::uint32_t>(cross);
-    return a1 * b1 + (cross >> 32) + (other >> 32);
+    const std::uint32_t a1 = upper_half(a), a0 = lower_half(a);
+    const std::uint32_t b1 = upper_half(b), b0 = lower_half(b);
+    const std::uint64_t cross = product(a1, b0) + upper_half(product(a0, b0));
+    const std::uint64_t other = product(a0, b1) + lower_half(cross);
+    return product(a1, b1) + upper_half(cross) + upper_half(other);
 }
 
 constexpr std::uint32_t eight_digits = 100000000;  // the first number of nine
@@ -148,8 +153,8 @@ inline char* show_integer(char* at, std::uint32_t n) {
 }
 
 inline char* show_integer(char* at, std::uint64_t n) {
-    const std::uint32_t upper = static_cast<std::uint32_t>(n >> 32);
-    const std::uint32_t lower = static_cast<std::uint32_t>(n);
+    const std::uint32_t upper = upper_half(n);
+    const std::uint32_t lower = lower_half(n);
     if (upper == 0) return show_integer(at, lower);
     if (upper < eight_digits) {
         KEL_UNINITIALIZED const LastEight ends(upper, lower);
