@@ -114,6 +114,8 @@ bool CORBA_Exception::Description::can_cast(const Description& target) const {
 
 // ---- the root ----
 
+CORBA_Exception::~CORBA_Exception() = default;
+
 const CORBA_Exception::Description* CORBA_Exception::_desc() const { return &_description; }
 const char* CORBA_Exception::_name() const { return _desc()->name(); }
 const char* CORBA_Exception::_repository_id() const { return _desc()->repository_id(); }
@@ -127,6 +129,25 @@ void CORBA_Exception::_pretty_print(KELostream& out) const {
 }
 
 // ---- ownership ----
+
+CORBA_Exception_var::~CORBA_Exception_var() { delete _exception; }
+
+CORBA_Exception_var& CORBA_Exception_var::operator=(CORBA_Exception* e) {
+    if (e != _exception) delete _exception;
+    _exception = e;
+    return *this;
+}
+
+CORBA_Exception*& CORBA_Exception_var::out() {
+    *this = nullptr;
+    return _exception;
+}
+
+CORBA_Exception* CORBA_Exception_var::_retn() {
+    CORBA_Exception* e = _exception;
+    _exception = nullptr;
+    return e;
+}
 
 void CORBA::release(CORBA_Exception* e) { delete e; }
 

@@ -94,7 +94,7 @@ public:
     CORBA_Exception() = default;
     CORBA_Exception(const CORBA_Exception&) = default;
     CORBA_Exception& operator=(const CORBA_Exception&) = default;
-    virtual ~CORBA_Exception() = default;
+    virtual ~CORBA_Exception();
 
     // The description of the object's own class.
     virtual const Description* _desc() const;
@@ -120,22 +120,19 @@ public:
     static Description _description;
 };
 
-// Owns an exception that was created on the heap; null is nothing to own.
+// Owns an exception that was created on the heap; null is nothing to own. What deletes it is not in line: of
+// plug-ins opened with RTLD_GLOBAL the later ones would use the copy of the first, and keep that loaded.
 class KEL_API CORBA_Exception_var {
 public:
     // Takes `e`, which may be null, over.
     CORBA_Exception_var(CORBA_Exception* e = nullptr) : _exception(e) {}
-    ~CORBA_Exception_var() { delete _exception; }
+    ~CORBA_Exception_var();
 
     CORBA_Exception_var(const CORBA_Exception_var&) = delete;
     CORBA_Exception_var& operator=(const CORBA_Exception_var&) = delete;
 
     // Deletes the held exception and adopts `e`. Adopting what is held already changes nothing.
-    CORBA_Exception_var& operator=(CORBA_Exception* e) {
-        if (e != _exception) delete _exception;
-        _exception = e;
-        return *this;
-    }
+    CORBA_Exception_var& operator=(CORBA_Exception* e);
 
     // The held exception, which must not be null.
     CORBA_Exception* operator->() const { return _exception; }
@@ -144,17 +141,8 @@ public:
     CORBA_Exception* in() const { return _exception; }
     // The held pointer, for a callee that may release and replace the exception.
     CORBA_Exception*& inout() { return _exception; }
-    // The same, with the held exception deleted first.
-    CORBA_Exception*& out() {
-        *this = nullptr;
-        return _exception;
-    }
-    // Hands the exception over to the caller.
-    CORBA_Exception* _retn() {
-        CORBA_Exception* const e = _exception;
-        _exception = nullptr;
-        return e;
-    }
+    CORBA_Exception*& out();   // deletes the held exception first
+    CORBA_Exception* _retn();  // hands the exception over to the caller
 
 private:
     CORBA_Exception* _exception;

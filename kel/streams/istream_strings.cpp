@@ -42,8 +42,8 @@ constexpr int end_of_input = std::char_traits<char>::eof();
 // is refused at 64 bits too, so that a false length ends alike at both widths.
 constexpr std::uint32_t largest_array = 0x7fffffff;
 
-// A string of `length` bytes and a terminator behind them, empty for the time being. It is one of
-// CORBA::string_alloc without the call, which short strings would feel.
+// A string of `length` bytes and a terminator behind them, empty for the time being. It is made as
+// CORBA::string_alloc makes one, without the call, which short strings would feel.
 char* new_string(std::uint32_t length) {
     if (length >= largest_array) throw std::bad_alloc();
     char* const s = new char[length + 1];

@@ -145,16 +145,15 @@ KEL_BLOCKS KEL_ALIGN_STACK std::size_t copy_blocks(char* to, const char* s, std:
 }
 
 template <Run run>
-[[gnu::noinline]] std::size_t copy_otherwise(char* to, const char* s, std::size_t n) {
-    return n >= block_size && found_to_compare_blocks() ? copy_blocks<run>(to, s, n)
-                                                        : copy_rest<run>(to, s, n, 0);
+[[gnu::cold, gnu::noinline]] std::size_t copy_when_asked(char* to, const char* s, std::size_t n) {
+    return found_to_compare_blocks() ? copy_blocks<run>(to, s, n) : copy_rest<run>(to, s, n, 0);
 }
 
 // The run at the beginning of `n` characters.
 template <Run run>
 std::size_t copy_run(char* to, const char* s, std::size_t n) {
-    return n >= block_size && known_to_compare_blocks() ? copy_blocks<run>(to, s, n)
-                                                        : copy_otherwise<run>(to, s, n);
+    if (n >= block_size && known_to_compare_blocks()) return copy_blocks<run>(to, s, n);
+    return n < block_size ? copy_rest<run>(to, s, n, 0) : copy_when_asked<run>(to, s, n);
 }
 
 }  // namespace

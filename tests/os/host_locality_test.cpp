@@ -234,7 +234,7 @@ TEST_F(Locality, WeakTestMakesNoIPv6Test) {
               "00");
 }
 
-TEST_F(Locality, WeakTestFreesBothTexts) {
+TEST_F(Locality, WeakTestLeavesNothingBehind) {
     EXPECT_EQ(said_on("192.0.2.7",
                       [] {
                           KELPortable::is_local("192.0.2.1");
