@@ -1,8 +1,11 @@
 // Headers, lines and the lock that keeps them whole.
 //
 // SPDX-License-Identifier: MIT
+#include <cerrno>
 #include <climits>
 #include <stdexcept>
+#include <thread>
+#include <utility>
 
 #include "tests/services/log_folder.h"
 #include "tests/support/child.h"
@@ -124,8 +127,45 @@ TEST_F(DebugLogLine, BothTimesOfAHeaderComeFromOneReading) {
     EXPECT_EQ(text_of(path), "=> Sun Sep  9 01:46:40 2001,03,10000001,server.cpp,42,1000000000\ntext\n");
 }
 
+TEST_F(DebugLogLine, TheTextOfASecondIsMadeOnce) {
+    header_at(0);
+    seams::ctime_r.forget_calls();
+    for (int i = 0; i < 3; ++i) next_header_at(some_time);
+    EXPECT_EQ(seams::ctime_r.calls(), 1);
+}
+
+// One that makes the text of a second keeps nobody else from writing a header.
+TEST_F(DebugLogLine, AThreadThatCannotHaveTheLastTextMakesItsOwn) {
+    header_at(0);
+    stop_clock(some_time);
+    const std::string other_path = folder.file("other");
+    KELDebugLogger other(other_path.c_str());
+    other.traceModule(module);
+    bool first = true;
+    seams::ctime_r.script([&](const std::time_t* now, char* text) {
+        if (std::exchange(first, false)) {
+            std::thread([&] { faulted([&] { write_line(other); }); }).join();
+        }
+        return seams::ctime_r.real(now, text);
+    });
+    const std::size_t before = text_of(path).size();
+    faulted([&] { write_line(log); });
+    const std::string line = "=> Sun Sep  9 01:46:40 2001,03,10000001,server.cpp,42,1000000000\ntext\n";
+    EXPECT_EQ(text_of(other_path), line);
+    EXPECT_EQ(text_of(path).substr(before), line);
+}
+
 TEST_F(DebugLogLine, ATimeWithoutATextPrintsNone) {
-    if (sizeof(std::time_t) == 4) GTEST_SKIP() << "every 32-bit time has a text";
+    header_at(0);
+    seams::ctime_r.fail(1, EOVERFLOW, true);
+    EXPECT_EQ(next_header_at(some_time), "=> ,03,10000001,server.cpp,42,1000000000\n\n");
+    seams::ctime_r.reset();
+    EXPECT_EQ(next_header_at(some_time),
+              "=> Sun Sep  9 01:46:40 2001,03,10000001,server.cpp,42,1000000000\n\n");
+}
+
+TEST_F(DebugLogLine, AYearOfFiveDigitsHasNoText) {
+    if (sizeof(std::time_t) == 4) GTEST_SKIP() << "no 32-bit time is that late";
     const long long year_ten_thousand = 253402300800;
     EXPECT_EQ(
         header_at(static_cast<std::time_t>(year_ten_thousand)),
