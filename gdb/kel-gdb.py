@@ -62,21 +62,21 @@ def quoted(text, limit):
     return '"' + ''.join(marks.get(c, c if c.isprintable() else '\\x%02x' % ord(c)) for c in text[:limit]) + '"' + more
 
 
-# --- Strings ------------------------------------------------------------------------------------------
-
-
-class NarrowText:
+# Of an object. What shows another part than the object itself has a constructor of its own.
+class Printer:
     def __init__(self, value):
         self.value = value
 
+
+# --- Strings ------------------------------------------------------------------------------------------
+
+
+class NarrowText(Printer):
     def to_string(self):
         return attempt(lambda: narrow(self.value['_ptr']))
 
 
-class WideText:
-    def __init__(self, value):
-        self.value = value
-
+class WideText(Printer):
     def to_string(self):
         return attempt(lambda: wide(self.value['_ptr']))
 
@@ -136,20 +136,14 @@ class SystemException:
 
 # An exception seen as the base of all: what it is, and for a system exception all of it. A user exception shows
 # its own fields and asks for this text as one of them.
-class AnyException:
-    def __init__(self, value):
-        self.value = value
-
+class AnyException(Printer):
     def to_string(self):
         value = attempt(lambda: self.value.cast(self.value.dynamic_type), self.value)
         kind = value.type.strip_typedefs()
         return SystemException(value).to_string() if is_standard(kind) else kind.tag
 
 
-class LoadError:
-    def __init__(self, value):
-        self.value = value
-
+class LoadError(Printer):
     def to_string(self):
         return 'KELLoadLibrary::LoadError, code %s, message %s' % (
             number(self.value['_code']), attempt(lambda: narrow(self.value['_message']['_ptr'])))
@@ -172,18 +166,12 @@ def held(pointer):
     return 'holds ' + (shown(target) if target is not None else address(pointer))
 
 
-class Environment:
-    def __init__(self, value):
-        self.value = value
-
+class Environment(Printer):
     def to_string(self):
         return 'CORBA_Environment, ' + attempt(lambda: held(self.value['_exception']['_exception']))
 
 
-class Description:
-    def __init__(self, value):
-        self.value = value
-
+class Description(Printer):
     def to_string(self):
         base = attempt(lambda: narrow(self.value['_base']['_name']) if int(self.value['_base']) else 'none')
         return 'description of %s, %s, base %s' % (attempt(lambda: narrow(self.value['_name'])),
@@ -206,10 +194,7 @@ def records(table):
             yield record.dereference()
 
 
-class Dictionary:
-    def __init__(self, value):
-        self.value = value
-
+class Dictionary(Printer):
     def to_string(self):
         value = self.value
         name = attempt(lambda: value.type.strip_typedefs().tag.split('<')[0])
@@ -249,34 +234,22 @@ def mutex_state(mutex):
     return 'held by LWP %d%s' % (int(data['__owner']), ', %d times' % depth if depth > 1 else '')
 
 
-class RWLock:
-    def __init__(self, value):
-        self.value = value
-
+class RWLock(Printer):
     def to_string(self):
         return 'KELRWLock, ' + attempt(lambda: lock_state(self.value))
 
 
-class Mutex:
-    def __init__(self, value):
-        self.value = value
-
+class Mutex(Printer):
     def to_string(self):
         return '%s, %s' % (self.value.type.strip_typedefs().tag, attempt(lambda: mutex_state(self.value)))
 
 
-class ThreadId:
-    def __init__(self, value):
-        self.value = value
-
+class ThreadId(Printer):
     def to_string(self):
         return attempt(lambda: thread_name(int(self.value['_id'])))
 
 
-class UniqueId:
-    def __init__(self, value):
-        self.value = value
-
+class UniqueId(Printer):
     def to_string(self):
         return str(number(self.value['_value']))
 
@@ -290,10 +263,7 @@ def thread_name(handle):
     return 'thread 0x%x' % handle
 
 
-class Thread:
-    def __init__(self, value):
-        self.value = value
-
+class Thread(Printer):
     def to_string(self):
         return thread_text(self.value)
 
@@ -367,10 +337,7 @@ def table_text(pointer):
                                      'in use' if int(table['_in_use']) else 'not in use')
 
 
-class Resource:
-    def __init__(self, value):
-        self.value = value
-
+class Resource(Printer):
     def to_string(self):
         return 'KELResource, ' + attempt(lambda: references(self.value))
 
@@ -381,20 +348,14 @@ def references(value):
     return '%d reference%s' % (count, '' if count == 1 else 's')
 
 
-class Pipe:
-    def __init__(self, value):
-        self.value = value
-
+class Pipe(Printer):
     def to_string(self):
         value = self.value
         return 'KELPipe, forward %s -> %s, return %s -> %s' % tuple(
             number(value[f]) for f in ('_write_fd', '_read_fd', '_return_write_fd', '_return_read_fd'))
 
 
-class Logger:
-    def __init__(self, value):
-        self.value = value
-
+class Logger(Printer):
     def to_string(self):
         value = self.value
         name = attempt(lambda: narrow(value['_file_name']))
