@@ -36,16 +36,15 @@ def _figure(times):
 def read(files):
     """The figures of all files: {work: {contender: Figure}}, in the order of the programs."""
     times, order = {}, {}
-    for topic, file in files:
+    for number, (topic, file) in enumerate(files):
         for run in json.load(open(file, encoding="utf-8"))["benchmarks"]:
             if run["run_type"] != "iteration" or run.get("error_occurred"):
                 continue
             work, contender = _SUFFIX.sub("", run["run_name"]).rsplit("/", 1)
             place = (topic, work)
-            order[place] = min(order.get(place, 1 << 30), run["family_index"])
+            order.setdefault(place, (number, run["family_index"]))
             times.setdefault(place, {}).setdefault(contender, []).append(_time_of(run))
-    topics = [topic for topic, _ in files]
-    places = sorted(times, key=lambda place: (topics.index(place[0]), order[place]))
+    places = sorted(times, key=order.get)
     return {place: {who: _figure(all_of) for who, all_of in times[place].items()} for place in places}
 
 
