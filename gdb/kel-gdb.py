@@ -62,7 +62,7 @@ def quoted(text, limit):
     return '"' + ''.join(marks.get(c, c if c.isprintable() else '\\x%02x' % ord(c)) for c in text[:limit]) + '"' + more
 
 
-# Of an object. What shows another part than the object itself has a constructor of its own.
+# Shows one object. A class that looks at it as its own class first, or at a part of it, has a constructor of its own.
 class Printer:
     def __init__(self, value):
         self.value = value
