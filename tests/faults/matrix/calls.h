@@ -5,8 +5,9 @@
 //   Fault            one failing call of one run
 //   apply            puts faults into the seams
 //
-// The errors are those of the manual pages. A call that cannot fail, such as getpid, has no row, and neither has
-// ctime_r: the log asks for a text once a second, so that how often depends on when a scenario runs.
+// The errors are those of the manual pages. A call that cannot fail, such as getpid, has no row, and
+// neither has ctime_r: the log asks for a text once a second, so that how often depends on when a
+// scenario runs.
 //
 // SPDX-License-Identifier: MIT
 #ifndef KEL_TESTS_FAULTS_MATRIX_CALLS_H
