@@ -1,4 +1,5 @@
 // SPDX-License-Identifier: MIT
+#include <kel/containers/internal/free_string.h>
 #include <kel/containers/strings.h>
 #include <kel/exceptions/raise.h>
 #include <kel/streams/istream.h>
@@ -11,10 +12,6 @@
 namespace {
 
 std::ios_base::Init iostream_init;
-
-// What a default-constructed holder holds. Writable, since a holder hands out a char*.
-char empty_string[1] = "";
-char* kEmptyString = empty_string;
 
 int compare_text(const char* a, const char* b) {
     if (a == 0) return b == 0 ? 0 : -1;
@@ -59,6 +56,8 @@ void read_terminated(KEListream& in, char* buffer, unsigned long capacity, unsig
 
 }  // namespace
 
+char kel::internal::empty_string[1] = "";
+
 char* CORBA_String_out::_nil = const_cast<char*>("(nil)");
 unsigned char CORBA_String_var::_allowing_null_string = 1;
 
@@ -73,10 +72,7 @@ char* CORBA::string_dup(const char* s) {
     return static_cast<char*>(std::memcpy(string_alloc(len), s, len + 1));
 }
 
-void CORBA::string_free(char* s) {
-    if (s == 0 || s == kEmptyString) return;
-    delete[] s;
-}
+void CORBA::string_free(char* s) { kel::internal::free_string(s); }
 
 unsigned long CORBA::hash(const char* s) {
     if (s == 0) return 0;
@@ -92,7 +88,7 @@ unsigned long CORBA::hash(const char* s) {
     return h & 0x7fffffff;
 }
 
-CORBA_String_var::CORBA_String_var() noexcept : _ptr(kEmptyString), _capacity(0) {}
+CORBA_String_var::CORBA_String_var() noexcept : _ptr(kel::internal::empty_string), _capacity(0) {}
 
 CORBA_String_var::CORBA_String_var(const char* s)
     : _ptr(CORBA::string_dup(s)), _capacity(s != 0 ? std::strlen(s) + 1 : 0) {}

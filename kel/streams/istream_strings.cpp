@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: MIT
-#include <kel/containers/strings.h>
+#include <kel/containers/internal/free_string.h>
 #include <kel/core/internal/attributes.h>
 #include <kel/streams/internal/areas.h>
 #include <kel/streams/internal/console.h>
@@ -23,6 +23,7 @@ using kel::internal::error_stream;
 using kel::internal::Escape;
 using kel::internal::escapes;
 using kel::internal::extract_value;
+using kel::internal::free_string;
 using kel::internal::has_own_functions;
 using kel::internal::InputCount;
 using kel::internal::is_cin;
@@ -283,7 +284,7 @@ KEL_FLATTEN KEListream& KEListream::operator>>(char*& s) {
     const bool in_memory = string != nullptr && scan_in_string<0>(in, *string, length);
     if (!in_memory) length = extract_length(in);
     _offset += 4;
-    if (s != nullptr) CORBA::string_free(s);
+    free_string(s);
     s = nullptr;
 
     if (length <= 1) {

@@ -4,14 +4,14 @@
 #include <kel/streams/internal/escapes.h>
 #include <kel/streams/internal/runs.h>
 
-#include <atomic>
-
 namespace kel {
 namespace internal {
 
-namespace {
+#ifndef __x86_64__
+std::atomic<Sse2> sse2{Sse2::not_asked};
+#endif
 
-enum class Run { plain, quoted };
+namespace {
 
 // The characters that end a run, or do not.
 struct Characters {
@@ -30,21 +30,9 @@ constexpr Characters told_apart() {
 }
 constexpr Characters characters = told_apart();
 
-constexpr std::size_t block_size = 16;
-
-// Every x86-64 processor compares sixteen characters at once, and every 32-bit one that tells so. It is asked
-// when that is not known, apart from the short way of a run.
 #ifdef __x86_64__
-inline bool known_to_compare_blocks() { return true; }
-inline bool found_to_compare_blocks() { return true; }
+bool found_to_compare_blocks() { return true; }
 #else
-enum class Sse2 { not_asked, absent, present };
-
-// No static of a function: a look at its guard, in a call, would take as long as a block.
-std::atomic<Sse2> sse2{Sse2::not_asked};
-
-inline bool known_to_compare_blocks() { return sse2.load(std::memory_order_relaxed) == Sse2::present; }
-
 [[gnu::cold]] bool found_to_compare_blocks() {
     if (sse2.load(std::memory_order_relaxed) == Sse2::not_asked) {
         unsigned a, b, c, d;
@@ -53,16 +41,6 @@ inline bool known_to_compare_blocks() { return sse2.load(std::memory_order_relax
     }
     return known_to_compare_blocks();
 }
-#endif
-
-#define KEL_BLOCKS __attribute__((target("sse2")))
-
-// Blocks that do not fit into registers are kept on the stack, which a 32-bit program may have aligned to
-// four bytes only.
-#ifdef __i386__
-#define KEL_ALIGN_STACK __attribute__((force_align_arg_pointer))
-#else
-#define KEL_ALIGN_STACK
 #endif
 
 KEL_BLOCKS __m128i block_at(const char* s) { return _mm_loadu_si128(reinterpret_cast<const __m128i*>(s)); }
@@ -113,6 +91,8 @@ KEL_BLOCKS void copy_last(char* to, const char* s, std::size_t n) {
     }
 }
 
+}  // namespace
+
 // Copies the run at the beginning of `n` characters, a block at least, in blocks, and four of them at once as
 // long as they are all in it. Long strings take an eighth of the time of single characters. The last block
 // lies upon others where `n` is no multiple of its size. What ends_of() tells may be in a plain run all the
@@ -145,23 +125,16 @@ KEL_BLOCKS KEL_ALIGN_STACK std::size_t copy_blocks(char* to, const char* s, std:
 }
 
 template <Run run>
-[[gnu::cold, gnu::noinline]] std::size_t copy_when_asked(char* to, const char* s, std::size_t n) {
-    return found_to_compare_blocks() ? copy_blocks<run>(to, s, n) : copy_rest<run>(to, s, n, 0);
+std::size_t copy_any(char* to, const char* s, std::size_t n) {
+    if (n >= block_size && found_to_compare_blocks()) return copy_blocks<run>(to, s, n);
+    return copy_rest<run>(to, s, n, 0);
 }
 
-// The run at the beginning of `n` characters.
-template <Run run>
-std::size_t copy_run(char* to, const char* s, std::size_t n) {
-    if (n >= block_size && known_to_compare_blocks()) return copy_blocks<run>(to, s, n);
-    return n < block_size ? copy_rest<run>(to, s, n, 0) : copy_when_asked<run>(to, s, n);
-}
-
-}  // namespace
-
-std::size_t copy_plain_run(char* to, const char* s, std::size_t n) { return copy_run<Run::plain>(to, s, n); }
-std::size_t copy_quoted_run(char* to, const char* s, std::size_t n) {
-    return copy_run<Run::quoted>(to, s, n);
-}
+#define KEL_COPIED(run)                                                            \
+    template std::size_t copy_blocks<run>(char* to, const char* s, std::size_t n); \
+    template std::size_t copy_any<run>(char* to, const char* s, std::size_t n)
+KEL_COPIED(Run::plain);
+KEL_COPIED(Run::quoted);
 
 }  // namespace internal
 }  // namespace kel
