@@ -24,6 +24,7 @@ std::vector<T> integers() {
     std::vector<T> values = {0, 1, std::numeric_limits<T>::min(), std::numeric_limits<T>::max()};
     for (std::uint64_t power = 1; power <= std::uint64_t(1) << 62; power *= 2) {
         for (int i = 0; i < 20; ++i) values.push_back(static_cast<T>(draw() % power));
+        values.push_back(static_cast<T>(0 - power));
     }
     for (std::uint64_t power = 10; power < 10000000000000000000u; power *= 10) {
         for (int i = -2; i <= 2; ++i) {

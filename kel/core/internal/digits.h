@@ -45,6 +45,11 @@ inline std::uint32_t pair_of_digits(std::uint32_t n) {
     return both;
 }
 
+// The halves of a number, and the product of two halves.
+inline std::uint32_t upper_half(std::uint64_t n) { return static_cast<std::uint32_t>(n >> 32); }
+inline std::uint32_t lower_half(std::uint64_t n) { return static_cast<std::uint32_t>(n); }
+inline std::uint64_t product(std::uint32_t a, std::uint32_t b) { return std::uint64_t(a) * b; }
+
 // The upper two digits of a number below 10,000, by one multiplication.
 inline std::uint32_t hundreds_of(std::uint32_t n) { return n * 5243 >> 19; }
 
@@ -55,10 +60,35 @@ inline void put_four(char* at, std::uint32_t n) {
     copy_bytes<2>(at + 2, pairs.characters[n - hundreds * 100]);
 }
 
+// Both halves of a product.
+struct Product {
+    Product(std::uint32_t a, std::uint32_t b) {
+#ifdef __i386__
+        // One instruction; the compiler would put the halves together and take them apart again.
+        __asm__("mull %[b]" : "=a"(lower), "=d"(upper) : "a"(a), [b] "r"(b) : "cc");
+#else
+        const std::uint64_t n = product(a, b);
+        lower = lower_half(n);
+        upper = upper_half(n);
+#endif
+    }
+    std::uint32_t lower;
+    std::uint32_t upper;
+};
+
+// The number as its upper two digits and a fraction, of which each multiplication by 100 brings the next two
+// in front of the point. There is no remainder to wait for, which spares a long integer a thirtieth of its
+// time. The fraction, of 24 bits at first, is too large by less than the last digit.
 inline void put_eight(char* at, std::uint32_t n) {
-    const std::uint32_t upper = n / 10000;
-    put_four(at, upper);
-    put_four(at + 4, n - upper * 10000);
+    const std::uint32_t millionth = (std::uint64_t(1) << (24 + 27)) / 1000000 + 1;
+    const std::uint32_t first = Product(n << 5, millionth).upper + 1;
+    copy_bytes<2>(at, pairs.characters[first >> 24]);
+    KEL_UNINITIALIZED const Product second(first << 8, 100);
+    copy_bytes<2>(at + 2, pairs.characters[second.upper]);
+    KEL_UNINITIALIZED const Product third(second.lower, 100);
+    copy_bytes<2>(at + 4, pairs.characters[third.upper]);
+    KEL_UNINITIALIZED const Product fourth(third.lower, 100);
+    copy_bytes<2>(at + 6, pairs.characters[fourth.upper]);
 }
 
 // The digits of a number below 10,000 without leading zeros, the first one lowest, and how many they are.
@@ -104,12 +134,7 @@ inline char* put_up_to_four(char* at, std::uint32_t n) {
     return at + digits.count;
 }
 
-// The halves of a number.
-inline std::uint32_t upper_half(std::uint64_t n) { return static_cast<std::uint32_t>(n >> 32); }
-inline std::uint32_t lower_half(std::uint64_t n) { return static_cast<std::uint32_t>(n); }
-
 // The upper half of a product, from the four products of halves: nothing wider is needed at 32 bits.
-inline std::uint64_t product(std::uint32_t a, std::uint32_t b) { return std::uint64_t(a) * b; }
 inline std::uint64_t high_product(std::uint64_t a, std::uint64_t b) {
     const std::uint32_t a1 = upper_half(a), a0 = lower_half(a);
     const std::uint32_t b1 = upper_half(b), b0 = lower_half(b);
@@ -152,9 +177,7 @@ inline char* show_integer(char* at, std::uint32_t n) {
     return at + 8;
 }
 
-inline char* show_integer(char* at, std::uint64_t n) {
-    const std::uint32_t upper = upper_half(n);
-    const std::uint32_t lower = lower_half(n);
+inline char* show_halves(char* at, std::uint32_t upper, std::uint32_t lower) {
     if (upper == 0) return show_integer(at, lower);
     if (upper < eight_digits) {
         KEL_UNINITIALIZED const LastEight ends(upper, lower);
@@ -170,17 +193,28 @@ inline char* show_integer(char* at, std::uint64_t n) {
     return at + 16;
 }
 
+inline char* show_integer(char* at, std::uint64_t n) { return show_halves(at, upper_half(n), lower_half(n)); }
+
 // Every other integer as the smallest of the two above that holds it.
 template <class T>
 char* show_integer(char* at, T value) {
-    typedef std::conditional_t<sizeof(T) <= 4, std::uint32_t, std::uint64_t> Unsigned;
-    Unsigned size = static_cast<Unsigned>(value);
     if constexpr (std::is_signed_v<T>) {
         *at = '-';
         at += value < 0;
-        size = value < 0 ? 0 - size : size;
     }
-    return show_integer(at, size);
+    if constexpr (sizeof(T) <= 4) {
+        const std::uint32_t size = static_cast<std::uint32_t>(value);
+        return show_integer(at, value < 0 ? 0 - size : size);
+    } else {
+        // By halves: a 32-bit compiler would have the number in memory while it turns the sign.
+        std::uint32_t upper = upper_half(static_cast<std::uint64_t>(value));
+        std::uint32_t lower = lower_half(static_cast<std::uint64_t>(value));
+        if (value < 0) {
+            lower = 0 - lower;
+            upper = ~upper + (lower == 0);
+        }
+        return show_halves(at, upper, lower);
+    }
 }
 
 }  // namespace internal
