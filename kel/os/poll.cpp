@@ -103,11 +103,13 @@ void KELPoll::defaultAPI(SupportedAPIs api) { __atomic_store(&_defaultAPI, &api,
 int KELPoll::milliseconds(timeval* tv) { return tv == nullptr ? -1 : to_milliseconds(*tv); }
 
 void KELPoll::add(int fd, short events, void* user) {
-    std::unique_ptr<pollfd[]> entries(_entries.grown());
-    std::unique_ptr<void*[]> users(_users.grown());
-    // Nothing below throws: a poller without memory is left as it was.
-    _entries.adopt(entries.release());
-    _users.adopt(users.release());
+    if (_entries.count == _entries.capacity || _users.count == _users.capacity) {
+        std::unique_ptr<pollfd[]> entries(_entries.grown());
+        std::unique_ptr<void*[]> users(_users.grown());
+        // Nothing below throws: a poller without memory is left as it was.
+        _entries.adopt(entries.release());
+        _users.adopt(users.release());
+    }
     _entries.append(pollfd{fd, events, 0});
     _users.append(user);
 }

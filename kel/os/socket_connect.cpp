@@ -8,11 +8,11 @@
 #include <kel/os/portable.h>
 #include <kel/os/socket.h>
 #include <netinet/in.h>
+#include <stddef.h>
 #include <string.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <memory>
 
 using kel::internal::AddressList;
@@ -90,18 +90,20 @@ int wait_until_connected(int& fd, unsigned long long timeout) {
 // Connect.AnUnknownLocalAddressCountsAsRefused.
 bool is_connected_to_itself(int fd, const sockaddr* addr, int addrlen) {
     SocketAddress local = {};
-    SocketAddress peer = {};
     socklen_t size = sizeof(local.v6);
     if (getsockname(fd, &local.any, &size) != 0) return true;
-    memcpy(&peer, addr, std::clamp<int>(addrlen, 0, sizeof(peer)));
 
-    if (local.any.sa_family != peer.any.sa_family) return false;
-    if (KELPortable::saGetPort(&local.any) != KELPortable::saGetPort(&peer.any)) return false;
+    // Family and port come first. The address is behind them, in IPv6 behind a flow label that may differ.
+    const char* const peer = reinterpret_cast<const char*>(addr);
+    const int ipv4_size = offsetof(sockaddr_in, sin_zero);
+    const int ipv6_size = offsetof(sockaddr_in6, sin6_scope_id);
+    const int ipv6_start = offsetof(sockaddr_in6, sin6_addr);
     switch (local.any.sa_family) {
         case AF_INET:
-            return memcmp(&local.v4.sin_addr, &peer.v4.sin_addr, sizeof(in_addr)) == 0;
+            return addrlen >= ipv4_size && memcmp(&local, peer, ipv4_size) == 0;
         case AF_INET6:
-            return memcmp(&local.v6.sin6_addr, &peer.v6.sin6_addr, sizeof(in6_addr)) == 0;
+            return addrlen >= ipv6_size && memcmp(&local, peer, offsetof(sockaddr_in6, sin6_flowinfo)) == 0 &&
+                   memcmp(&local.v6.sin6_addr, peer + ipv6_start, sizeof(in6_addr)) == 0;
         default:
             return false;
     }

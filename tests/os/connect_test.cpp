@@ -290,6 +290,17 @@ TEST_F(Connect, AnIPv6SocketThatMetItselfCountsAsRefused) {
     expect_failed(ECONNREFUSED);
 }
 
+TEST_F(Connect, AnIPv6SocketThatMetItselfIsRecognisedByAddressAndPortAlone) {
+    net.local_address = "[2001:db8::1]:80";
+    SocketAddress to = socket_address("[2001:db8::1]:80");
+    to.v6.sin6_flowinfo = htonl(7);
+    fd = net.open_socket(AF_INET6);
+    seams::connect.script([](int, const sockaddr*, socklen_t) { return 0; });
+    Armed armed;
+    KELPortable::tcpConnect(fd, err, &to.any, offsetof(sockaddr_in6, sin6_scope_id), 0);
+    expect_failed(ECONNREFUSED);
+}
+
 TEST_F(Connect, ASocketThatMetItselfAfterAWaitCountsAsRefused) {
     net.connects = {EINPROGRESS};
     net.waits = {{1, 0}};
@@ -350,16 +361,19 @@ TEST_F(Connect, ReadsNoMoreThanTheGivenAddress) {
         mmap(nullptr, 2 * size, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0));
     ASSERT_NE(memory, MAP_FAILED);
     mprotect(memory + size, size, PROT_NONE);
-    const SocketAddress to = socket_address("10.1.1.1:80");
     seams::connect.script([](int, const sockaddr*, socklen_t) { return 0; });
     fd = net.open_socket();
-    for (const int given : {8, 2, 0, -1}) {
-        const int readable = std::max(given, 0);
-        char* const address = memory + size - readable;
-        std::memcpy(address, &to, static_cast<std::size_t>(readable));
-        Armed armed;
-        KELPortable::tcpConnect(fd, err, reinterpret_cast<sockaddr*>(address), given, 0);
-        EXPECT_EQ(err, 0);
+    for (const char* const end : {"10.1.1.1:80", "[2001:db8::1]:80"}) {
+        net.local_address = end;
+        const SocketAddress to = socket_address(end);
+        for (const int given : {7, 2, 0, -1}) {
+            const int readable = std::max(given, 0);
+            char* const address = memory + size - readable;
+            std::memcpy(address, &to, static_cast<std::size_t>(readable));
+            Armed armed;
+            KELPortable::tcpConnect(fd, err, reinterpret_cast<sockaddr*>(address), given, 0);
+            EXPECT_EQ(err, 0);
+        }
     }
     munmap(memory, 2 * size);
     expect_connected();
