@@ -355,7 +355,7 @@ private:
 
     // What removeAll comes to when nobody hears of it, not even the entries: a third of its steps.
     void delete_entries() {
-        for (std::uint32_t i = 0; _count != 0; ++i) {
+        for (std::uint32_t i = 0; i < _capacity && _count != 0; ++i) {
             if (_table[i] == 0) continue;
             delete _table[i];
             --_count;

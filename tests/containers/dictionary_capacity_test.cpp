@@ -56,6 +56,14 @@ TEST_F(DictionaryCapacity, SetCapacitySetsBitsAndMaskAndForgetsTheCount) {
     used.setCapacity(16);
 }
 
+TEST_F(DictionaryCapacity, ATableThatForgotItsCountEndsWithItsSlots) {
+    IntegerTable table;
+    table.add(KELUniqueId(1), 1);
+    table.setCapacity(16);
+    table.removeKey(KELUniqueId(1));
+    EXPECT_EQ(table.count(), 0xffffffffu);
+}
+
 TEST_F(DictionaryCapacity, CapacityBeyondTheSlotNumbersIsRefused) {
     IntegerTable table;
     EXPECT_THROW(table.setCapacity(0x40000001ul), std::bad_alloc);
