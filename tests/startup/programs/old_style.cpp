@@ -15,13 +15,28 @@
 
 namespace {
 
+class Started : public KELThread {
+public:
+    Started() : KELThread(0) {}
+    void begin() override {}
+};
+
+void* (*handed_to_factory)(void*);
+void remember(unsigned long, void* (*start)(void*), void*) { handed_to_factory = start; }
+
+bool start_routines_agree() {
+    KELThread::_factory = remember;
+    Started().run();
+    return handed_to_factory == &KELThread::_start;
+}
+
 // The library handed the addresses out; this program has its own idea of them.
 bool factories_agree() {
     const CORBA::Exception::Description* const described =
         CORBA::Exception::Description::desc("IDL:omg.org/CORBA/TRANSIENT:1.0");
     return described == &CORBA::TRANSIENT::_description &&
            described->factory() == &CORBA::TRANSIENT::_factory &&
-           KELThread::_factory == &KELThread::_create_thread;
+           KELThread::_factory == &KELThread::_create_thread && start_routines_agree();
 }
 
 bool goes_and_comes(const std::string& sent) {
