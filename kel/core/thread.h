@@ -45,13 +45,14 @@ public:
 
     // The identifier of the system.
     pthread_t id() const { return __atomic_load_n(&_id, __ATOMIC_RELAXED); }
-    // Whether both stand for the same thread.
-    bool operator==(const KELThreadId& other) const { return id() == other.id(); }
-    bool operator!=(const KELThreadId& other) const { return id() != other.id(); }
 
 private:
     pthread_t _id;
 };
+
+// Whether both stand for the same thread.
+inline bool operator==(const KELThreadId& a, const KELThreadId& b) { return a.id() == b.id(); }
+inline bool operator!=(const KELThreadId& a, const KELThreadId& b) { return !(a == b); }
 
 // 0 when the identifiers are equal, otherwise their order as numbers.
 KEL_API int compare(const KELThreadId& a, const KELThreadId& b);

@@ -48,6 +48,8 @@ TEST_F(ThreadId, EqualityIsThatOfTheIdentifiers) {
     EXPECT_FALSE(KELThreadId(5) == KELThreadId(6));
     EXPECT_TRUE(KELThreadId(5) != KELThreadId(6));
     EXPECT_FALSE(KELThreadId(5) != KELThreadId(5));
+    EXPECT_TRUE(pthread_t(5) == KELThreadId(5));
+    EXPECT_TRUE(pthread_t(5) != KELThreadId(6));
 }
 
 TEST_F(ThreadId, IsAKeyOfDictionaries) {
