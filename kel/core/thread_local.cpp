@@ -91,11 +91,12 @@ KELThreadLocal::KELThreadLocal(unsigned long slot) : _owner(pthread_self()), _sl
         existing->add(KELUniqueId(slot), this);
         return;
     }
+    // Any value but null makes the key's destructor run, which finds nothing where there is no memory below.
+    pthread_setspecific(_key, this);
     std::unique_ptr<SlotTable> table(new SlotTable);
     table->add(KELUniqueId(slot), this);
     thread_table().add(_owner, table.get());
     table.release();
-    pthread_setspecific(_key, this);  // any value but null makes the key's destructor run
 }
 
 // Deliberate: the calling thread's key value is set even when another thread owns the object. Objects

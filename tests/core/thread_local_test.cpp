@@ -120,6 +120,18 @@ TEST_F(ThreadLocal, IsRegisteredEvenWhenTheKeyValueCannotBeSet) {
     EXPECT_EQ(KELThreadLocal::instance(slot), &object);
 }
 
+TEST_F(ThreadLocal, SetsTheKeyValueBeforeTheThreadHasATable) {
+    { Local makes_the_key(slot); }
+    bool has_table = true;
+    seams::pthread_setspecific.script([&](pthread_key_t key, const void* value) {
+        has_table = KELThreadLocal::_key_dict->count() != 0;
+        return seams::pthread_setspecific.real(key, value);
+    });
+    Armed armed;
+    Local object(slot);
+    EXPECT_FALSE(has_table);
+}
+
 TEST_F(ThreadLocal, LeavesTheMutexFree) {
     Local object(slot);
     EXPECT_FALSE(is_held(KELThreadLocal::_mutex));
