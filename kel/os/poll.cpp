@@ -198,7 +198,7 @@ int KELImplSelect::_waitForEvents(timeval* tv) {
         }
     }
     timeval copy = tv != nullptr ? *tv : timeval();  // select may write into its time-out
-    return select(std::clamp<int>(_nfds, 0, FD_SETSIZE), watched[0], watched[1], watched[2],
+    return select(std::min<int>(_nfds, FD_SETSIZE), watched[0], watched[1], watched[2],
                   tv != nullptr ? &copy : nullptr);
 }
 
