@@ -34,6 +34,7 @@
 
 #include <cstddef>
 #include <iosfwd>
+#include <type_traits>
 
 class KEL_API CORBA_Exception {
 public:
@@ -209,7 +210,8 @@ typedef ::CORBA_UserException UserException;
 
 // Deletes an exception that was created on the heap. Null is allowed.
 KEL_API void release(CORBA_Exception* e);
-inline void release(std::nullptr_t) {}
+template <class Null, class = typename std::enable_if<std::is_same<Null, std::nullptr_t>::value>::type>
+inline void release(Null) {}  // a null without a type, whatever else may be released
 
 }  // namespace CORBA
 
