@@ -76,8 +76,9 @@ function(kel_library_options target)
     target_compile_options(${target} PRIVATE -fno-semantic-interposition)
     # Arguments are stored where the stack already reaches, instead of moving it before and after each call.
     # What calls often takes a fortieth less time, and the tables for unwinding are smaller by a fifth.
-    # What is cleared, as most locals are, is cleared by stores one after the other. In the loops that there
-    # would be for it a connect would spend a three-hundredth of its time.
+    # Locals of more than 32 bytes would be cleared by a string instruction, which is slow to start. A loop of
+    # eight bytes at a time clears them up to 64 bytes, a call what is larger: a connect takes a
+    # three-hundredth less time.
     if(KEL_WORD_SIZE EQUAL 32)
       target_compile_options(${target} PRIVATE -maccumulate-outgoing-args
         -mmemset-strategy=unrolled_loop:64:noalign,libcall:-1:noalign)

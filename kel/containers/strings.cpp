@@ -13,6 +13,8 @@ namespace {
 
 std::ios_base::Init iostream_init;
 
+char* const kEmptyString = kel::internal::empty_string;
+
 int compare_text(const char* a, const char* b) {
     if (a == 0) return b == 0 ? 0 : -1;
     if (b == 0) return 1;
@@ -88,7 +90,7 @@ unsigned long CORBA::hash(const char* s) {
     return h & 0x7fffffff;
 }
 
-CORBA_String_var::CORBA_String_var() noexcept : _ptr(kel::internal::empty_string), _capacity(0) {}
+CORBA_String_var::CORBA_String_var() noexcept : _ptr(kEmptyString), _capacity(0) {}
 
 CORBA_String_var::CORBA_String_var(const char* s)
     : _ptr(CORBA::string_dup(s)), _capacity(s != 0 ? std::strlen(s) + 1 : 0) {}

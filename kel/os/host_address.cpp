@@ -214,7 +214,7 @@ char* KELPortable::peer_addr(int fd, unsigned short&) {
 
 bool KELPortable::is_local(const char* host) {
     KELRMutex_var hold(_mutex, 1);
-    const char* const own = own_ip_text();
+    const char* const own = own_ip_text();  // asked for once, whatever the first host is
     // The usual text is not read as an address first, which would take a two-hundredth of a whole connect.
     if (host != nullptr && is_loopback(host)) return true;
     const char* const asked = ip_text(host);

@@ -290,6 +290,16 @@ TEST_F(Connect, AnIPv6SocketThatMetItselfCountsAsRefused) {
     expect_failed(ECONNREFUSED);
 }
 
+TEST_F(Connect, ASocketThatMetItselfIsRecognisedByAddressAndPortAlone) {
+    net.local_address = "10.1.1.1:80";
+    SocketAddress to = socket_address("10.1.1.1:80");
+    fd = net.open_socket();
+    seams::connect.script([](int, const sockaddr*, socklen_t) { return 0; });
+    Armed armed;
+    KELPortable::tcpConnect(fd, err, &to.any, offsetof(sockaddr_in, sin_zero), 0);
+    expect_failed(ECONNREFUSED);
+}
+
 TEST_F(Connect, AnIPv6SocketThatMetItselfIsRecognisedByAddressAndPortAlone) {
     net.local_address = "[2001:db8::1]:80";
     SocketAddress to = socket_address("[2001:db8::1]:80");
@@ -363,16 +373,20 @@ TEST_F(Connect, ReadsNoMoreThanTheGivenAddress) {
     mprotect(memory + size, size, PROT_NONE);
     seams::connect.script([](int, const sockaddr*, socklen_t) { return 0; });
     fd = net.open_socket();
-    for (const char* const end : {"10.1.1.1:80", "[2001:db8::1]:80"}) {
+    const struct {
+        const char* end;
+        std::vector<int> sizes;
+    } ends[] = {{"10.1.1.1:80", {-1, 0, 2, 7}}, {"[2001:db8::1]:80", {-1, 0, 2, 7, 23}}};
+    for (const auto& [end, sizes] : ends) {
         net.local_address = end;
         const SocketAddress to = socket_address(end);
-        for (const int given : {7, 2, 0, -1}) {
+        for (const int given : sizes) {
             const int readable = std::max(given, 0);
             char* const address = memory + size - readable;
             std::memcpy(address, &to, static_cast<std::size_t>(readable));
             Armed armed;
             KELPortable::tcpConnect(fd, err, reinterpret_cast<sockaddr*>(address), given, 0);
-            EXPECT_EQ(err, 0);
+            EXPECT_EQ(err, 0) << end << ' ' << given;
         }
     }
     munmap(memory, 2 * size);

@@ -216,6 +216,15 @@ TEST_F(Locality, WeakTestKnowsTheLoopbackOnAMachineWithoutAnAddress) {
     EXPECT_EQ(said_on("", [] { std::cout << KELPortable::is_local("127.0.0.1"); }), "1");
 }
 
+TEST_F(Locality, WeakTestAsksForTheOwnAddressWhateverTheHost) {
+    EXPECT_EQ(said_on("juno",
+                      [] {
+                          FakeResolver resolver({}, "192.0.2.7");
+                          std::cout << KELPortable::is_local("127.0.0.1") << resolver.names.size();
+                      }),
+              "11");
+}
+
 TEST_F(Locality, WeakTestIsFalseForAnUnknownHost) {
     EXPECT_EQ(said_on("juno",
                       [] {

@@ -5,11 +5,13 @@
 #ifndef KEL_CONTAINERS_INTERNAL_FREE_STRING_H
 #define KEL_CONTAINERS_INTERNAL_FREE_STRING_H
 
+#include <kel/config.h>
+
 namespace kel {
 namespace internal {
 
 // What a default-constructed holder holds. Writable, since a holder hands out a char*.
-extern char empty_string[1];
+KEL_LOCAL extern char empty_string[1];
 
 // As CORBA::string_free.
 inline void free_string(char* s) {

@@ -53,7 +53,7 @@ inline std::uint64_t product(std::uint32_t a, std::uint32_t b) { return std::uin
 // The upper two digits of a number below 10,000, by one multiplication.
 inline std::uint32_t hundreds_of(std::uint32_t n) { return n * 5243 >> 19; }
 
-// Numbers below 10,000 and 100,000,000 with leading zeros.
+// A number below 10,000 with leading zeros.
 inline void put_four(char* at, std::uint32_t n) {
     const std::uint32_t hundreds = hundreds_of(n);
     copy_bytes<2>(at, pairs.characters[hundreds]);
@@ -76,9 +76,10 @@ struct Product {
     std::uint32_t upper;
 };
 
-// The number as its upper two digits and a fraction, of which each multiplication by 100 brings the next two
-// in front of the point. There is no remainder to wait for, which spares a long integer a thirtieth of its
-// time. The fraction, of 24 bits at first, is too large by less than the last digit.
+// A number below 100,000,000 with leading zeros: its upper two digits and a fraction, of which each
+// multiplication by 100 brings the next two in front of the point. There is no remainder to wait for, which
+// spares a long integer a thirtieth of its time. The fraction, of 24 bits at first, is too large by less than
+// the last digit.
 inline void put_eight(char* at, std::uint32_t n) {
     const std::uint32_t millionth = (std::uint64_t(1) << (24 + 27)) / 1000000 + 1;
     const std::uint32_t first = Product(n << 5, millionth).upper + 1;

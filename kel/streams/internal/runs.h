@@ -1,9 +1,15 @@
-// Copies of the characters that stand for themselves in a quoted string, as far as they go. Both change
-// nothing behind what they copy, and return how many that were.
+// Copies of the characters that stand for themselves in a quoted string, as far as they go.
+//
+//   copy_plain_run     for its writer
+//   copy_quoted_run    for its reader
+//
+// Both change nothing behind what they copy, and return how many characters that were.
 //
 // SPDX-License-Identifier: MIT
 #ifndef KEL_STREAMS_INTERNAL_RUNS_H
 #define KEL_STREAMS_INTERNAL_RUNS_H
+
+#include <kel/config.h>
 
 #include <cstddef>
 
@@ -26,7 +32,7 @@ inline bool known_to_compare_blocks() { return true; }
 enum class Sse2 { not_asked, absent, present };
 
 // No static of a function: a look at its guard, in a call, would take as long as a block.
-extern std::atomic<Sse2> sse2;
+KEL_LOCAL extern std::atomic<Sse2> sse2;
 
 inline bool known_to_compare_blocks() { return sse2.load(std::memory_order_relaxed) == Sse2::present; }
 #endif
@@ -41,7 +47,8 @@ inline bool known_to_compare_blocks() { return sse2.load(std::memory_order_relax
 #define KEL_ALIGN_STACK
 #endif
 
-// The run at the beginning of `n` characters: of a block at least, where blocks are compared, and of any.
+// The run at the beginning of `n` characters. The first takes a block of them at least, on a processor that
+// is known to compare blocks; the second takes any number, and asks the processor where that is not known.
 template <Run run>
 KEL_BLOCKS KEL_ALIGN_STACK std::size_t copy_blocks(char* to, const char* s, std::size_t n);
 template <Run run>
@@ -54,13 +61,13 @@ std::size_t copy_run(char* to, const char* s, std::size_t n) {
     return copy_any<run>(to, s, n);
 }
 
-// For its writer: those of the first of `n` characters that are graphic characters of ASCII or blanks, which
+// Those of the first of `n` characters that are graphic characters of ASCII or blanks, which
 // every locale can print, and none of the escaped ones.
 inline std::size_t copy_plain_run(char* to, const char* s, std::size_t n) {
     return copy_run<Run::plain>(to, s, n);
 }
 
-// For its reader: those of the first of `n` characters that are no quote, backslash or newline.
+// Those of the first of `n` characters that are no quote, backslash or newline.
 inline std::size_t copy_quoted_run(char* to, const char* s, std::size_t n) {
     return copy_run<Run::quoted>(to, s, n);
 }
