@@ -273,6 +273,7 @@ TEST(Release, IgnoresNull) {
     const long before = kel::test::AllocationPlan::live_blocks();
     CORBA::release(static_cast<CORBA_Exception*>(nullptr));
     CORBA::release(nullptr);
+    CORBA::release(0);
     EXPECT_EQ(kel::test::AllocationPlan::live_blocks(), before);
 }
 
