@@ -9,14 +9,17 @@ build() {
     }
 }
 
-# Runs test program $1 in its folder with the arguments that follow. What it says goes to the file
-# <program>.log in the folder $logs; repeats what failed.
+# Runs test program $1 in its folder with the arguments that follow, for forty minutes at most: several
+# times what the longest takes. What it says goes to the file <program>.log in the folder $logs; repeats
+# what failed.
 run_program() {
-    local program=$1 log
+    local program=$1 log status=0
     log=$PWD/$logs/$(basename "$1").log
     shift
-    (cd "$(dirname "$program")" && "./$(basename "$program")" --gtest_brief=1 "$@") </dev/null >"$log" 2>&1 && return
-    echo "$program failed:"
+    (cd "$(dirname "$program")" && timeout 40m "./$(basename "$program")" --gtest_brief=1 "$@") </dev/null >"$log" 2>&1 ||
+        status=$?
+    [ $status -ne 0 ] || return 0
+    if [ $status -eq 124 ]; then echo "$program did not end:"; else echo "$program failed:"; fi
     grep -aE '^\[  FAILED|seed of|Failure$|terminate called|ERROR|error:' "$log" | tail -n 40
     tail -n 3 "$log"
     return 1

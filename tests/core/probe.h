@@ -4,13 +4,11 @@
 //   native        the POSIX mutex inside a mutex
 //   slot_of       the slot of a virtual operation
 //   is_held       whether a mutex is held, asked from another thread
-//   task_count    how many threads the process has
 //
 // SPDX-License-Identifier: MIT
 #ifndef KEL_TESTS_CORE_PROBE_H
 #define KEL_TESTS_CORE_PROBE_H
 
-#include <dirent.h>
 #include <kel/core/mutex.h>
 #include <kel/core/spin_mutex.h>
 #include <pthread.h>
@@ -62,21 +60,6 @@ bool is_held(Mutex& m) {
     });
     asker.join();
     return held;
-}
-
-// The thread sanitizer adds one of its own.
-#if defined(__SANITIZE_THREAD__)
-const int tasks_without_ours = 2;
-#else
-const int tasks_without_ours = 1;
-#endif
-
-inline int task_count() {
-    int tasks = 0;
-    DIR* const folder = opendir("/proc/self/task");
-    while (const dirent* entry = readdir(folder)) tasks += entry->d_name[0] != '.';
-    closedir(folder);
-    return tasks;
 }
 
 }  // namespace test

@@ -17,6 +17,7 @@
 #include "tests/core/gate.h"
 #include "tests/core/probe.h"
 #include "tests/support/fault.h"
+#include "tests/support/tasks.h"
 
 namespace kel {
 namespace test {
@@ -61,7 +62,7 @@ protected:
 
     // A thread that has ended has released its slots; taking the mutex orders that before what follows.
     static void wait_for_the_end_of_threads() {
-        while (task_count() > tasks_without_ours) std::this_thread::yield();
+        ASSERT_TRUE(others_end());
         KELRMutex_var after_the_last_release(KELThreadLocal::_mutex, 1);
     }
 };

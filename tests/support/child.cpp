@@ -2,6 +2,7 @@
 #include "tests/support/child.h"
 
 #include <fcntl.h>
+#include <gtest/gtest.h>
 #include <poll.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -13,6 +14,7 @@
 #include <iostream>
 
 #include "tests/support/fault.h"
+#include "tests/support/tasks.h"
 
 extern char** environ;
 
@@ -94,6 +96,9 @@ Outcome start_and_wait(const std::string& input, const std::function<void()>& in
     return outcome;
 }
 
+// A detached thread of the test before may still be at its end, with a mutex in its hands.
+void become_the_only_thread() { EXPECT_TRUE(others_end()) << "other threads run while a child is made"; }
+
 [[noreturn]] void run_and_exit(const std::function<void()>& body) {
     int code = 0;
     try {
@@ -128,6 +133,7 @@ std::string take_line(std::string& text) {
 }  // namespace
 
 Outcome in_child(const std::function<void()>& body) {
+    become_the_only_thread();
     return start_and_wait("", [&] { run_and_exit(body); });
 }
 
@@ -145,6 +151,7 @@ Outcome run_program(const std::vector<std::string>& program, const std::vector<s
 }
 
 Assertion assertion_of(const std::function<void()>& body) {
+    become_the_only_thread();
     Pipe report;
     Assertion seen;
     seen.child = start_and_wait("", [&] {

@@ -8,7 +8,8 @@
 //     const Outcome o = in_child([] { std::cout << "hello"; });
 //     EXPECT_EQ(o.out, "hello");
 //
-// Fork only while the process has one thread.
+// The two that start no new program first wait for the end of the other threads, and fail the test when these
+// do not end: what a thread holds meanwhile would be held for ever in the child.
 //
 // SPDX-License-Identifier: MIT
 #ifndef KEL_TESTS_SUPPORT_CHILD_H

@@ -4,31 +4,20 @@
 //                   is still there
 //
 // SPDX-License-Identifier: MIT
-#include <dirent.h>
 #include <dlfcn.h>
 
 #include <iostream>
 
-namespace {
-
-int count_threads() {
-    int n = 0;
-    DIR* const tasks = opendir("/proc/self/task");
-    while (const dirent* entry = readdir(tasks)) n += entry->d_name[0] != '.';
-    closedir(tasks);
-    return n;
-}
-
-}  // namespace
+#include "tests/support/tasks.h"
 
 int main(int, char** argv) {
-    std::cout << "threads " << count_threads() << std::endl;
+    std::cout << "threads " << kel::test::task_count() << std::endl;
     void* const library = dlopen(argv[1], RTLD_NOW);
     if (library == nullptr) {
         std::cerr << dlerror() << std::endl;
         return 1;
     }
-    std::cout << "threads " << count_threads() << std::endl;
+    std::cout << "threads " << kel::test::task_count() << std::endl;
     dlclose(library);
     if (dlopen(argv[1], RTLD_NOW | RTLD_NOLOAD) != nullptr) std::cout << "resident" << std::endl;
     return 0;

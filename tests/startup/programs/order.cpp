@@ -10,7 +10,6 @@
 //
 // SPDX-License-Identifier: MIT
 #include <cxxabi.h>
-#include <dirent.h>
 #include <dlfcn.h>
 #include <kel/core/thread.h>
 #include <kel/core/thread_local.h>
@@ -19,6 +18,8 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+
+#include "tests/support/tasks.h"
 
 namespace {
 
@@ -75,14 +76,6 @@ void print_if_locked(const Lock& lock, const char* name) {
     }
 }
 
-int count_threads() {
-    int n = 0;
-    DIR* const tasks = opendir("/proc/self/task");
-    while (const dirent* entry = readdir(tasks)) n += entry->d_name[0] != '.';
-    closedir(tasks);
-    return n;
-}
-
 }  // namespace
 
 extern "C" int __cxa_atexit(void (*destroy)(void*), void* object, void* dso_handle) {
@@ -107,6 +100,6 @@ int main() {
     for (int i = 0; i < registered_count; ++i) print("built", registered[i]);
     print_if_locked(KELThread::_mutex, "KELThread::_mutex");
     print_if_locked(KELThreadLocal::_mutex, "KELThreadLocal::_mutex");
-    std::printf("threads %d\n", count_threads());
+    std::printf("threads %d\n", kel::test::task_count());
     return 0;
 }
