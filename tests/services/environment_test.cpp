@@ -17,6 +17,7 @@
 
 #include "tests/support/child.h"
 #include "tests/support/fault.h"
+#include "tests/support/tasks.h"
 
 namespace {
 
@@ -82,7 +83,7 @@ private:
     std::function<void()> _body;
 };
 
-// Returns when `body` has run; the thread ends on its own.
+// Returns when `body` has run and the thread, which ends on its own, has cleaned up behind itself.
 void in_kel_thread(const std::function<void()>& body) {
     Semaphore done;
     (new Runner([&] {
@@ -90,6 +91,7 @@ void in_kel_thread(const std::function<void()>& body) {
         done.post();
     }))->run();
     done.wait();
+    EXPECT_TRUE(kel::test::others_end());
 }
 
 void in_thread(const std::function<void()>& body) { std::thread(body).join(); }
