@@ -32,7 +32,7 @@ void open(benchmark::State& state, const char* library) {
 void load_line(const char* who, const char* library) {
     line("first dlopen in a fresh process", who, [=](benchmark::State& state) { open(state, library); })
         ->UseManualTime()
-        ->Iterations(20);
+        ->Iterations(3);
 }
 
 const bool registered = [] {

@@ -1,7 +1,9 @@
 """What the programs of the bench measured, as their JSON output says it.
 
 A line is named "work/contender", a point of a curve "growth: work/contender@size". Every one is measured several
-times in changing order; its figure is the median, its spread the distance between the middle two quarters' ends.
+times in changing order; its figure is the median of those that were measured while the machine was quiet, its spread
+the distance between the ends of their middle two quarters. Where one contender has too few of these, all times of all
+contenders of the line count, as what disturbed one would else be missing from another.
 """
 
 import json
@@ -11,9 +13,14 @@ from collections import namedtuple
 
 LIMIT, KEL = "limit", "kel"
 
+QUIET = 1.1  # of the least time that the probe took in the whole run
+FEWEST = 9   # quiet times that a figure is made of
+
 Figure = namedtuple("Figure", "ns spread least")  # the spread as a share of the median
+Timed = namedtuple("Timed", "ns probe")
 Goal = namedtuple("Goal", "peer most")
-Work = namedtuple("Work", "topic name figures goal")  # figures by contender
+Line = namedtuple("Line", "figures taken quiet is_quiet")  # figures by contender; how many times, and which count
+Work = namedtuple("Work", "topic name figures goal line")
 
 _SUFFIX = re.compile(r"/(real_time|manual_time|iterations:\d+|process_time|threads:\d+|repeats:\d+)")
 
@@ -25,16 +32,23 @@ def _time_of(run):
     return run["real_time" if on_the_wall else "cpu_time"] * factor / run.get("items", 1)
 
 
-def _figure(times):
+def _figure(all_times):
+    times = [timed.ns for timed in all_times]
     median = statistics.median(times)
-    if len(times) < 2:
-        return Figure(median, 0, median)
-    low, _, high = statistics.quantiles(times, n=4, method="inclusive")
+    low, _, high = statistics.quantiles(times, n=4, method="inclusive") if len(times) > 1 else times * 3
     return Figure(median, (high - low) / median, min(times))
 
 
+def _line(contenders, least_probe):
+    quiet = {who: [timed for timed in times if timed.probe <= QUIET * least_probe] for who, times in contenders.items()}
+    is_quiet = min(map(len, quiet.values())) >= FEWEST
+    chosen = quiet if is_quiet else contenders
+    return Line({who: _figure(times) for who, times in chosen.items()}, sum(map(len, contenders.values())),
+                sum(map(len, quiet.values())), is_quiet)
+
+
 def read(files):
-    """The figures of all files: {work: {contender: Figure}}, in the order of the programs."""
+    """What all files tell: {(topic, work): Line}, in the order of the programs."""
     times, order = {}, {}
     for number, (topic, file) in enumerate(files):
         for run in json.load(open(file, encoding="utf-8"))["benchmarks"]:
@@ -43,9 +57,10 @@ def read(files):
             work, contender = _SUFFIX.sub("", run["run_name"]).rsplit("/", 1)
             place = (topic, work)
             order.setdefault(place, (number, run["family_index"]))
-            times.setdefault(place, {}).setdefault(contender, []).append(_time_of(run))
+            times.setdefault(place, {}).setdefault(contender, []).append(Timed(_time_of(run), run["probe"]))
     places = sorted(times, key=order.get)
-    return {place: {who: _figure(all_of) for who, all_of in times[place].items()} for place in places}
+    least_probe = min(timed.probe for place in places for all_of in times[place].values() for timed in all_of)
+    return {place: _line(times[place], least_probe) for place in places}
 
 
 def _rows(file):
@@ -64,21 +79,21 @@ def reasons(file):
     return {work: text for work, text in _rows(file)}
 
 
-def works(figures, wanted):
+def works(measured, wanted):
     """Those that have goals first, in the order of their list, then the others."""
-    lines = [place for place in figures if not place[1].startswith("growth: ")]
+    lines = [place for place in measured if not place[1].startswith("growth: ")]
     ordered = [place for place in wanted if place in lines] + [place for place in lines if place not in wanted]
-    return [Work(place[0], place[1], figures[place], wanted.get(place)) for place in ordered
-            if KEL in figures[place]]
+    return [Work(place[0], place[1], measured[place].figures, wanted.get(place), measured[place]) for place in ordered
+            if KEL in measured[place].figures]
 
 
-def curves(figures):
+def curves(measured):
     """{work: {contender: [(size, ns)]}}"""
     result = {}
-    for (_, work), by_contender in figures.items():
+    for (_, work), line in measured.items():
         if not work.startswith("growth: "):
             continue
-        for contender, figure in by_contender.items():
+        for contender, figure in line.figures.items():
             who, size = contender.rsplit("@", 1)
             result.setdefault(work[len("growth: "):], {}).setdefault(who, []).append((int(size), figure.ns))
     return {work: {who: sorted(points) for who, points in lines.items()} for work, lines in result.items()}

@@ -111,12 +111,19 @@ def summary(works):
     return text + (f"; missed: {', '.join(missed)}." if missed else ".")
 
 
+def quietness(works):
+    quiet, taken = sum(work.line.quiet for work in works), sum(work.line.taken for work in works)
+    text = f"In this run {quiet:,} of {taken:,} repetitions were undisturbed."
+    short = [work.name for work in works if not work.line.is_quiet]
+    return text + (f" Too few were in these lines, of which all count: {', '.join(short)}." if short else "")
+
+
 def page(bits, works, curves, folder, suffix):
     template = open(os.path.join(TOP, "bench", "page", "page.md.in"), encoding="utf-8").read()
     why = figures.reasons(os.path.join(TOP, "bench", "reasons.txt"))
     return template.format(
         width="32-bit x86" if bits == "32" else "x86-64", option="" if bits == "32" else " --x86_64",
-        suffix=suffix, summary=summary(works), table=marked_table(works), reasons=reason_list(works, why),
+        suffix=suffix, summary=summary(works), quiet=quietness(works), table=marked_table(works), reasons=reason_list(works, why),
         profiles=profile_list(works, folder),
         machine=open(os.path.join(folder, "machine.txt"), encoding="utf-8").read().strip(),
         curves=", ".join(sorted({name.split(",")[0] for name in curves})))
@@ -136,7 +143,7 @@ def main(bits, folder, *topics):
     measured = figures.read(files)
     works = figures.works(measured, figures.goals(os.path.join(TOP, "bench", "goals.txt")))
     print(plain_table(works))
-    print(f"\n{summary(works)}")
+    print(f"\n{summary(works)} {quietness(works)}")
     why = figures.reasons(os.path.join(TOP, "bench", "reasons.txt"))
     for work in unexplained(works, why):
         print(f"bench: bench/reasons.txt does not say why \"{work.name}\" is behind")

@@ -10,14 +10,16 @@
 // Contenders are kLimit, the least the machine can do it with, kKel, and peers under their own names.
 // bench/goals.txt says which peer a goal is against. A line's time is processor time of the measuring
 // thread; call UseRealTime() on what is returned where others do the work. A counter "items" divides the
-// time: it is then that of one item.
+// time: it is then that of one item. A counter "probe" tells how quiet the machine was around the time.
 //
 // SPDX-License-Identifier: MIT
 #ifndef KEL_BENCH_SUPPORT_BENCH_H
 #define KEL_BENCH_SUPPORT_BENCH_H
 
+#include <bench/support/quiet.h>
 #include <benchmark/benchmark.h>
 
+#include <algorithm>
 #include <string>
 
 namespace bench {
@@ -27,7 +29,11 @@ const char* const kKel = "kel";
 
 template <class Body>
 benchmark::internal::Benchmark* line(const std::string& work, const std::string& contender, Body body) {
-    return benchmark::RegisterBenchmark((work + "/" + contender).c_str(), body);
+    return benchmark::RegisterBenchmark((work + "/" + contender).c_str(), [body](benchmark::State& state) {
+        const double before = wait_for_quiet();
+        body(state);
+        state.counters["probe"] = std::max(before, probe());
+    });
 }
 
 template <class Body>
