@@ -4,7 +4,7 @@
 // a time. What that does to a work depends on the work: to instructions side by side much, to waits for
 // memory little. So ratios that were measured meanwhile are those of another machine.
 //
-//   wait_for_quiet  waits until a probe takes no longer than ever before, for a bounded time
+//   wait_for_quiet  waits until a probe takes hardly longer than the shortest before, for a bounded time
 //   probe           nanoseconds of a loop that does the same each time, and fills a processor
 //
 // SPDX-License-Identifier: MIT
