@@ -19,8 +19,13 @@ FEWEST = 9   # quiet times that a figure is made of
 Figure = namedtuple("Figure", "ns spread least")  # the spread as a share of the median
 Timed = namedtuple("Timed", "ns probe")
 Goal = namedtuple("Goal", "peer most")
-Line = namedtuple("Line", "figures taken quiet is_quiet")  # figures by contender; how many times, and which count
-Work = namedtuple("Work", "topic name figures goal line")
+Line = namedtuple("Line", "figures taken quiet is_quiet")  # by contender; how many times; whether the quiet alone count
+
+
+class Work(namedtuple("Work", "topic name line goal")):
+    """A line of the table."""
+    figures = property(lambda self: self.line.figures)
+
 
 _SUFFIX = re.compile(r"/(real_time|manual_time|iterations:\d+|process_time|threads:\d+|repeats:\d+)")
 
@@ -40,7 +45,8 @@ def _figure(all_times):
 
 
 def _line(contenders, least_probe):
-    quiet = {who: [timed for timed in times if timed.probe <= QUIET * least_probe] for who, times in contenders.items()}
+    quiet = {who: [timed for timed in times if timed.probe <= QUIET * least_probe]
+             for who, times in contenders.items()}
     is_quiet = min(map(len, quiet.values())) >= FEWEST
     chosen = quiet if is_quiet else contenders
     return Line({who: _figure(times) for who, times in chosen.items()}, sum(map(len, contenders.values())),
@@ -83,8 +89,7 @@ def works(measured, wanted):
     """Those that have goals first, in the order of their list, then the others."""
     lines = [place for place in measured if not place[1].startswith("growth: ")]
     ordered = [place for place in wanted if place in lines] + [place for place in lines if place not in wanted]
-    return [Work(place[0], place[1], measured[place].figures, wanted.get(place), measured[place]) for place in ordered
-            if KEL in measured[place].figures]
+    return [Work(*place, measured[place], wanted.get(place)) for place in ordered if KEL in measured[place].figures]
 
 
 def curves(measured):

@@ -123,8 +123,8 @@ def page(bits, works, curves, folder, suffix):
     why = figures.reasons(os.path.join(TOP, "bench", "reasons.txt"))
     return template.format(
         width="32-bit x86" if bits == "32" else "x86-64", option="" if bits == "32" else " --x86_64",
-        suffix=suffix, summary=summary(works), quiet=quietness(works), table=marked_table(works), reasons=reason_list(works, why),
-        profiles=profile_list(works, folder),
+        suffix=suffix, summary=summary(works), quiet=quietness(works), table=marked_table(works),
+        reasons=reason_list(works, why), profiles=profile_list(works, folder),
         machine=open(os.path.join(folder, "machine.txt"), encoding="utf-8").read().strip(),
         curves=", ".join(sorted({name.split(",")[0] for name in curves})))
 

@@ -16,7 +16,7 @@ namespace bench {
 // The least of three probes, so that an interrupt in one of them is not taken for a neighbour.
 double probe();
 
-// Gives the probe that it ended with: a long one when the machine did not become quiet in some tens of
+// Gives the shortest probe meanwhile: a long one when the machine did not become quiet in some tens of
 // milliseconds.
 double wait_for_quiet();
 

@@ -24,21 +24,22 @@ const int tasks_without_ours = 2;
 const int tasks_without_ours = 1;
 #endif
 
-// The folder of the threads is linked to by itself, by its parent and by the folder of each thread. Neither
-// allocates nor opens anything.
+// The folder of the threads is linked to by itself, by its parent and by the folder of each thread: asking
+// for the links allocates nothing and opens nothing. Negative when the system does not tell.
 inline int task_count() {
     struct stat folder;
     return ::stat("/proc/self/task", &folder) == 0 ? static_cast<int>(folder.st_nlink) - 2 : -1;
 }
 
-// False when there are others still after half a minute.
+// False when there are others still after half a minute, or when the system does not tell.
 inline bool others_end() {
     const auto limit = std::chrono::steady_clock::now() + std::chrono::seconds(30);
-    while (task_count() > tasks_without_ours) {
-        if (std::chrono::steady_clock::now() > limit) return false;
+    int count = task_count();
+    while (count > tasks_without_ours && std::chrono::steady_clock::now() < limit) {
         std::this_thread::yield();
+        count = task_count();
     }
-    return true;
+    return count >= 1 && count <= tasks_without_ours;
 }
 
 }  // namespace test
